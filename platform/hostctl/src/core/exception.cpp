@@ -1,0 +1,12 @@
+#include "hostctl/exception.h"
+
+namespace HostCtl {
+
+const std::string emptyString;
+
+namespace Lib {
+
+HostCtlException::~HostCtlException() = default;
+
+}  // namespace Lib
+}  // namespace HostCtl

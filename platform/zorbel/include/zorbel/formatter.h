@@ -1,0 +1,49 @@
+// Rendering of command results: "simple", "table" and "json".
+#pragma once
+
+#include <iosfwd>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "zorbel/metaobj.h"
+
+namespace Zorbel::Format {
+
+// Display parameters: the command's defaults ("fields:RECORD", "header:RECORD",
+// "units:RECORD.FIELD", "table-columns", "table-columns:RECORD", "wrap-last").
+class OutputParameters {
+public:
+    OutputParameters() = default;
+    explicit OutputParameters(std::vector<std::pair<std::string, std::string>> entries)
+        : entries_(std::move(entries)) {}
+
+    // A later entry of the same key overrides an earlier one.
+    void Set(const std::string& key, const std::string& value);
+    std::optional<std::string> Get(const std::string& key) const;
+
+    // Terminal width for "wrap-last"; 0 means $COLUMNS, else 80.
+    int columns = 0;
+
+private:
+    std::vector<std::pair<std::string, std::string>> entries_;
+};
+
+// The names of the formatters, in the order help lists them.
+const std::vector<std::string>& FormatterNames();
+bool IsFormatter(const std::string& name);
+
+// Renders root with the named formatter. Unknown names render as "simple".
+void Render(const std::string& formatter, const MetaObj::MetaObject& root, const OutputParameters& parameters,
+            std::string& out);
+
+// JSON text of a string (with the quotes), escaped as JSON requires; bytes that are not
+// valid UTF-8 become U+FFFD.
+void AppendJsonString(std::string& out, const std::string& text);
+
+// Splits text into lines of at most width characters at blanks (a longer word stands on a
+// line of its own).
+std::vector<std::string> WrapText(const std::string& text, std::size_t width);
+
+}  // namespace Zorbel::Format

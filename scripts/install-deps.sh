@@ -3,7 +3,7 @@
 # it installs only what is missing.
 set -euo pipefail
 
-packages=(cmake g++ ninja-build libboost-regex-dev nlohmann-json3-dev libgtest-dev libgmock-dev
+packages=(cmake g++ ninja-build libboost1.81-dev nlohmann-json3-dev libgtest-dev libgmock-dev
           libbenchmark-dev clang libclang-rt-dev)
 
 missing=()

@@ -65,6 +65,13 @@ std::string Children(NamespaceNode& node, bool commands) {
     return Listing(rows);
 }
 
+std::string EnumValues(const ParameterConstraint& constraint) {
+    std::string values;
+    for (const auto& entry : constraint.GetStringEnum()) values += (values.empty() ? "" : ", ") + entry.value;
+    for (long value : constraint.GetIntEnum()) values += (values.empty() ? "" : ", ") + std::to_string(value);
+    return values;
+}
+
 std::string RangeText(const ParameterConstraint& constraint) {
     return std::to_string(constraint.GetRangeLow()) + " to " + std::to_string(constraint.GetRangeHigh());
 }
@@ -171,19 +178,14 @@ std::string ExpandDescription(const ParameterSpec& parameter) {
     std::string text = parameter.GetDescription();
     const ParameterConstraint* constraint = parameter.GetConstraint().get();
     if (text.find('%') == std::string::npos) return text;
-    std::string values;
+    std::string values = constraint ? EnumValues(*constraint) : std::string();
     std::string full;
-    if (constraint && constraint->GetType() == CallSpec::CONSTRAINT_STRING_ENUM) {
+    if (constraint) {
         for (const auto& entry : constraint->GetStringEnum()) {
-            values += (values.empty() ? "" : ", ") + entry.value;
             full += "\n    " + entry.value;
             if (!entry.help.empty()) full += ": " + entry.help;
         }
-    } else if (constraint && constraint->GetType() == CallSpec::CONSTRAINT_INT_ENUM) {
-        for (long value : constraint->GetIntEnum()) {
-            values += (values.empty() ? "" : ", ") + std::to_string(value);
-            full += "\n    " + std::to_string(value);
-        }
+        for (long value : constraint->GetIntEnum()) full += "\n    " + std::to_string(value);
     }
     ReplaceAll(text, "%FULLENUM%", full);
     ReplaceAll(text, "%ENUM%", "[" + values + "]");
@@ -265,7 +267,16 @@ std::string CommandText(const std::string& program, const std::string& path, con
         if (parameter->IsRequired()) notes.push_back("required");
         if (parameter->GetType() == CallSpec::PARAM_STRING_LIST) notes.push_back("may be repeated");
         if (const auto& constraint = parameter->GetConstraint()) {
-            if (constraint->GetType() == CallSpec::CONSTRAINT_INT_RANGE) notes.push_back(RangeText(*constraint));
+            const bool listed = parameter->GetDescription().find("ENUM%") != std::string::npos;
+            switch (constraint->GetType()) {
+                case CallSpec::CONSTRAINT_INT_RANGE: notes.push_back(RangeText(*constraint)); break;
+                case CallSpec::CONSTRAINT_INT_ENUM:
+                case CallSpec::CONSTRAINT_STRING_ENUM:
+                    if (!listed) notes.push_back("one of: " + EnumValues(*constraint));
+                    break;
+                case CallSpec::CONSTRAINT_STRING_REGEX: notes.push_back("pattern: " + constraint->GetRegex()); break;
+                default: break;
+            }
         }
         if (!notes.empty()) {
             head += "  (";

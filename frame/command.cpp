@@ -1,0 +1,120 @@
+#include "frame/command.h"
+
+namespace TalvexCli::NetworkNamespace::Frame {
+
+using namespace Zorbel;
+
+const char* const kDefaultNetstack = "defaultTcpipStack";
+
+void Describe(AutoCli::Command& command, const Description& description) {
+    command.SetDescription(description.description);
+    if (description.type) command.SetMetaDataField("type", description.type);
+    if (description.formatter) command.SetDefaultOutputFormatter(description.formatter);
+    for (const auto& [key, value] : description.outputParameters) command.SetDefaultOutputParameter(key, value);
+}
+
+Constraint Range(long low, long high) {
+    Constraint c;
+    c.kind = CallSpec::CONSTRAINT_INT_RANGE;
+    c.low = low;
+    c.high = high;
+    return c;
+}
+
+Constraint IntEnum(std::initializer_list<long> values) {
+    Constraint c;
+    c.kind = CallSpec::CONSTRAINT_INT_ENUM;
+    c.ints = values;
+    return c;
+}
+
+Constraint StringEnum(std::vector<std::pair<std::string, std::string>> values) {
+    Constraint c;
+    c.kind = CallSpec::CONSTRAINT_STRING_ENUM;
+    c.strings = std::move(values);
+    return c;
+}
+
+Constraint Regex(std::string pattern) {
+    Constraint c;
+    c.kind = CallSpec::CONSTRAINT_STRING_REGEX;
+    c.regex = std::move(pattern);
+    return c;
+}
+
+std::shared_ptr<CallSpec::ParameterSpec> MakeParameter(const Param& param) {
+    auto spec = CallSpec::ParameterSpec::New(param.name, static_cast<CallSpec::ParameterType>(param.type));
+    spec->SetShortName(param.shortName);
+    spec->SetDescription(param.description);
+    if (param.constraint.kind != CallSpec::CONSTRAINT_NONE) {
+        auto constraint = CallSpec::ParameterConstraint::New(param.constraint.kind);
+        switch (param.constraint.kind) {
+            case CallSpec::CONSTRAINT_INT_RANGE:
+                constraint->SetIntRange(param.constraint.low, param.constraint.high);
+                break;
+            case CallSpec::CONSTRAINT_INT_ENUM:
+                for (long value : param.constraint.ints) constraint->AddIntEnum(value);
+                break;
+            case CallSpec::CONSTRAINT_STRING_ENUM:
+                for (const auto& [value, help] : param.constraint.strings) constraint->AddStringEnum(value, help);
+                break;
+            case CallSpec::CONSTRAINT_STRING_REGEX:
+                constraint->SetStringRegex(param.constraint.regex);
+                break;
+            default:
+                break;
+        }
+        spec->SetConstraint(constraint);
+    }
+    spec->SetRequired(param.required == kRequired);
+    return spec;
+}
+
+InputSpecPtr MakeInputSpec(const std::vector<Param>& params) {
+    auto spec = CallSpec::InputSpec::New();
+    for (const auto& param : params) spec->AddParameter(MakeParameter(param));
+    return spec;
+}
+
+std::string Netstack(const CallSpec::Input& input, const char* name) {
+    const std::string& value = input.GetParameter(name);
+    return value.empty() ? std::string(kDefaultNetstack) : value;
+}
+
+namespace {
+OutputSpecPtr WithRoot(std::shared_ptr<MetaObj::MetaObject> root) {
+    auto spec = CallSpec::OutputSpec::New();
+    spec->SetRootObject(std::move(root));
+    return spec;
+}
+}  // namespace
+
+OutputSpecPtr BoolOutput() { return WithRoot(MetaObj::MetaBool::New()); }
+OutputSpecPtr IntOutput() { return WithRoot(MetaObj::MetaInt::New()); }
+OutputSpecPtr StringOutput() { return WithRoot(MetaObj::MetaString::New()); }
+OutputSpecPtr RecordOutput(RecordPtr record) { return WithRoot(std::move(record)); }
+OutputSpecPtr ListOutput(RecordPtr prototype) { return WithRoot(MakeList(std::move(prototype))); }
+
+Field StringField(std::string name) { return {std::move(name), MetaObj::MetaString::New()}; }
+Field IntField(std::string name) { return {std::move(name), MetaObj::MetaInt::New()}; }
+Field BoolField(std::string name) { return {std::move(name), MetaObj::MetaBool::New()}; }
+Field StringListField(std::string name) { return {std::move(name), MetaObj::MetaList::New(MetaObj::META_STRING)}; }
+Field RecordField(std::string name, RecordPtr prototype) { return {std::move(name), std::move(prototype)}; }
+Field RecordListField(std::string name, RecordPtr prototype) {
+    return {std::move(name), MakeList(std::move(prototype))};
+}
+
+RecordPtr MakeRecord(const std::string& recordName, const std::vector<Field>& fields) {
+    auto record = MetaObj::MetaStruct::New(recordName);
+    // Each record gets values of its own: the field list may be shared by many records.
+    for (const auto& field : fields) record->SetField(field.name, field.empty->Clone());
+    return record;
+}
+
+ListPtr MakeList(RecordPtr prototype) { return MetaObj::MetaList::New(MetaObj::META_STRUCT, std::move(prototype)); }
+
+void SetResult(const OutputPtr& output, bool value) { output->SetRootObject(MetaObj::MetaBool::New(value)); }
+
+void Fail(const std::string& message) { throw HostCtl::Lib::HostCtlException(message); }
+
+}  // namespace TalvexCli::NetworkNamespace::Frame

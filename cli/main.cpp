@@ -59,7 +59,8 @@ int Main(int argc, char** argv) {
     std::vector<std::string> rest;
     std::string error;
     if (!Zorbel::AutoCli::ParseGlobalOptions(args, options, rest, error)) {
-        std::cerr << "Error: " << error << "\nUsage: hadrocli [global options] NAMESPACE... COMMAND [options]; "
+        std::cerr << "Error: " << error
+                  << "\nUsage: hadrocli [global options] NAMESPACE... COMMAND [options]; "
                   << "see 'hadrocli --help'.\n";
         return Zorbel::AutoCli::EXIT_REFUSED;
     }

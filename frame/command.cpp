@@ -10,7 +10,8 @@ void Describe(AutoCli::Command& command, const Description& description) {
     command.SetDescription(description.description);
     if (description.type) command.SetMetaDataField("type", description.type);
     if (description.formatter) command.SetDefaultOutputFormatter(description.formatter);
-    for (const auto& [key, value] : description.outputParameters) command.SetDefaultOutputParameter(key, value);
+    for (const auto& [key, value] : description.outputParameters)
+        command.SetDefaultOutputParameter(key, value);
 }
 
 Constraint Range(long low, long high) {
@@ -53,10 +54,12 @@ std::shared_ptr<CallSpec::ParameterSpec> MakeParameter(const Param& param) {
                 constraint->SetIntRange(param.constraint.low, param.constraint.high);
                 break;
             case CallSpec::CONSTRAINT_INT_ENUM:
-                for (long value : param.constraint.ints) constraint->AddIntEnum(value);
+                for (long value : param.constraint.ints)
+                    constraint->AddIntEnum(value);
                 break;
             case CallSpec::CONSTRAINT_STRING_ENUM:
-                for (const auto& [value, help] : param.constraint.strings) constraint->AddStringEnum(value, help);
+                for (const auto& [value, help] : param.constraint.strings)
+                    constraint->AddStringEnum(value, help);
                 break;
             case CallSpec::CONSTRAINT_STRING_REGEX:
                 constraint->SetStringRegex(param.constraint.regex);
@@ -72,7 +75,8 @@ std::shared_ptr<CallSpec::ParameterSpec> MakeParameter(const Param& param) {
 
 InputSpecPtr MakeInputSpec(const std::vector<Param>& params) {
     auto spec = CallSpec::InputSpec::New();
-    for (const auto& param : params) spec->AddParameter(MakeParameter(param));
+    for (const auto& param : params)
+        spec->AddParameter(MakeParameter(param));
     return spec;
 }
 
@@ -89,17 +93,37 @@ OutputSpecPtr WithRoot(std::shared_ptr<MetaObj::MetaObject> root) {
 }
 }  // namespace
 
-OutputSpecPtr BoolOutput() { return WithRoot(MetaObj::MetaBool::New()); }
-OutputSpecPtr IntOutput() { return WithRoot(MetaObj::MetaInt::New()); }
-OutputSpecPtr StringOutput() { return WithRoot(MetaObj::MetaString::New()); }
-OutputSpecPtr RecordOutput(RecordPtr record) { return WithRoot(std::move(record)); }
-OutputSpecPtr ListOutput(RecordPtr prototype) { return WithRoot(MakeList(std::move(prototype))); }
+OutputSpecPtr BoolOutput() {
+    return WithRoot(MetaObj::MetaBool::New());
+}
+OutputSpecPtr IntOutput() {
+    return WithRoot(MetaObj::MetaInt::New());
+}
+OutputSpecPtr StringOutput() {
+    return WithRoot(MetaObj::MetaString::New());
+}
+OutputSpecPtr RecordOutput(RecordPtr record) {
+    return WithRoot(std::move(record));
+}
+OutputSpecPtr ListOutput(RecordPtr prototype) {
+    return WithRoot(MakeList(std::move(prototype)));
+}
 
-Field StringField(std::string name) { return {std::move(name), MetaObj::MetaString::New()}; }
-Field IntField(std::string name) { return {std::move(name), MetaObj::MetaInt::New()}; }
-Field BoolField(std::string name) { return {std::move(name), MetaObj::MetaBool::New()}; }
-Field StringListField(std::string name) { return {std::move(name), MetaObj::MetaList::New(MetaObj::META_STRING)}; }
-Field RecordField(std::string name, RecordPtr prototype) { return {std::move(name), std::move(prototype)}; }
+Field StringField(std::string name) {
+    return {std::move(name), MetaObj::MetaString::New()};
+}
+Field IntField(std::string name) {
+    return {std::move(name), MetaObj::MetaInt::New()};
+}
+Field BoolField(std::string name) {
+    return {std::move(name), MetaObj::MetaBool::New()};
+}
+Field StringListField(std::string name) {
+    return {std::move(name), MetaObj::MetaList::New(MetaObj::META_STRING)};
+}
+Field RecordField(std::string name, RecordPtr prototype) {
+    return {std::move(name), std::move(prototype)};
+}
 Field RecordListField(std::string name, RecordPtr prototype) {
     return {std::move(name), MakeList(std::move(prototype))};
 }
@@ -107,14 +131,21 @@ Field RecordListField(std::string name, RecordPtr prototype) {
 RecordPtr MakeRecord(const std::string& recordName, const std::vector<Field>& fields) {
     auto record = MetaObj::MetaStruct::New(recordName);
     // Each record gets values of its own: the field list may be shared by many records.
-    for (const auto& field : fields) record->SetField(field.name, field.empty->Clone());
+    for (const auto& field : fields)
+        record->SetField(field.name, field.empty->Clone());
     return record;
 }
 
-ListPtr MakeList(RecordPtr prototype) { return MetaObj::MetaList::New(MetaObj::META_STRUCT, std::move(prototype)); }
+ListPtr MakeList(RecordPtr prototype) {
+    return MetaObj::MetaList::New(MetaObj::META_STRUCT, std::move(prototype));
+}
 
-void SetResult(const OutputPtr& output, bool value) { output->SetRootObject(MetaObj::MetaBool::New(value)); }
+void SetResult(const OutputPtr& output, bool value) {
+    output->SetRootObject(MetaObj::MetaBool::New(value));
+}
 
-void Fail(const std::string& message) { throw HostCtl::Lib::HostCtlException(message); }
+void Fail(const std::string& message) {
+    throw HostCtl::Lib::HostCtlException(message);
+}
 
 }  // namespace TalvexCli::NetworkNamespace::Frame

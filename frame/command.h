@@ -20,16 +20,18 @@
 //   public:
 //       virtual std::shared_ptr<Zorbel::MetaObj::MetaStruct> GetOutputStructure();
 //   };
-#define NETWORK_COMMAND(Class)                                                                              \
-public:                                                                                                    \
-    static std::shared_ptr<Class> New() { return std::make_shared<Class>(); }                              \
-    Class();                                                                                               \
-    ~Class() override = default;                                                                           \
-    std::shared_ptr<Zorbel::CallSpec::InputSpec> GetInputSpecInternal() override;                         \
-    std::shared_ptr<Zorbel::CallSpec::OutputSpec> GetOutputSpecInternal() override;                       \
-    void ExecuteInternal(std::shared_ptr<Zorbel::CallSpec::Input> input,                                   \
-                         std::shared_ptr<Zorbel::CallSpec::Output> output) override;                        \
-                                                                                                           \
+#define NETWORK_COMMAND(Class)                                                       \
+public:                                                                              \
+    static std::shared_ptr<Class> New() {                                            \
+        return std::make_shared<Class>();                                            \
+    }                                                                                \
+    Class();                                                                         \
+    ~Class() override = default;                                                     \
+    std::shared_ptr<Zorbel::CallSpec::InputSpec> GetInputSpecInternal() override;    \
+    std::shared_ptr<Zorbel::CallSpec::OutputSpec> GetOutputSpecInternal() override;  \
+    void ExecuteInternal(std::shared_ptr<Zorbel::CallSpec::Input> input,             \
+                         std::shared_ptr<Zorbel::CallSpec::Output> output) override; \
+                                                                                     \
 private:
 
 namespace TalvexCli::NetworkNamespace {

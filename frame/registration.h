@@ -11,13 +11,8 @@ namespace TalvexCli::NetworkNamespace {
 struct TreeEntry {
     const char* path;
     const char* description;  // namespaces only
-    const char* className;    // commands only
-    std::shared_ptr<Zorbel::AutoCli::NamespaceNode> (*factory)();  // null while the class is not built
+    const char* className;    // commands only; registered once its subsystem builds the class
 };
-
-// The rows in creation order.
-const TreeEntry* TreeBegin();
-const TreeEntry* TreeEnd();
 
 // Builds the tree and hangs it under parent as "network".
 void RegisterTree(std::shared_ptr<Zorbel::AutoCli::NamespaceNode>& parent);

@@ -22,17 +22,21 @@ InputSpecPtr SampleThingSet::GetInputSpecInternal() {
         {"name", "n", kString, "The name.", kRequired},
         {"mtu", "m", kInt, "The MTU.", kOptional, Range(1280, 9000)},
         {"speed", "S", kInt, "Speed :%ENUM%", kOptional, IntEnum({10, 100})},
-        {"duplex", "D", kString, "Duplex %FULLENUM%", kOptional, StringEnum({{"full", "Full duplex"}, {"half", ""}})},
+        {"duplex", "D", kString, "Duplex %FULLENUM%", kOptional,
+         StringEnum({{"full", "Full duplex"}, {"half", ""}})},
         {"interface-name", "i", kString, "Interface.", kOptional, Regex("tkn[0-9]+")},
         {"netstack", "N", kString, "Netstack."},
     });
 }
 
-OutputSpecPtr SampleThingSet::GetOutputSpecInternal() { return BoolOutput(); }
+OutputSpecPtr SampleThingSet::GetOutputSpecInternal() {
+    return BoolOutput();
+}
 
 RecordPtr SampleThingSet::GetOutputStructure() {
-    return MakeRecord("Thing", {StringField("Name"), IntField("MTU"), BoolField("Up"), StringListField("Tags"),
-                                RecordField("Link", MakeRecord("Link", {IntField("Speed")}))});
+    return MakeRecord("Thing",
+                      {StringField("Name"), IntField("MTU"), BoolField("Up"), StringListField("Tags"),
+                       RecordField("Link", MakeRecord("Link", {IntField("Speed")}))});
 }
 
 void SampleThingSet::ExecuteInternal(InputPtr input, OutputPtr output) {
@@ -113,7 +117,8 @@ TEST(FrameHelpers, HostControlFailuresBecomeOneMessage) {
 
     output = Zorbel::CallSpec::Output::New();
     command->Execute(Named("own"), output);
-    EXPECT_EQ(output->GetErrorMessages(), std::vector<std::string>{"Unable to set thing. Error was : its own message"});
+    EXPECT_EQ(output->GetErrorMessages(),
+              std::vector<std::string>{"Unable to set thing. Error was : its own message"});
     EXPECT_EQ(output->GetRootObject(), nullptr);
 
     // Only the host-control exception is caught.

@@ -25,7 +25,8 @@ std::shared_ptr<NamespaceNode> Network() {
 std::shared_ptr<NamespaceNode> Resolve(const std::string& path) {
     std::list<std::string> words;
     std::istringstream in(path);
-    for (std::string word; in >> word;) words.push_back(word);
+    for (std::string word; in >> word;)
+        words.push_back(word);
     words.pop_front();  // "network"
     auto node = Network()->ResolveNode(words);
     return words.empty() ? node : nullptr;
@@ -40,17 +41,19 @@ TEST(Tree, EightyFourNamespacesEachDescribed) {
         if (node->GetType() != Zorbel::AutoCli::NODE_NAMESPACE) return;
         ++namespaces;
         EXPECT_FALSE(node->GetDescription().empty()) << node->GetPathString(' ');
-        for (const auto& child : node->GetNamespaceNodes()) walk(child);
+        for (const auto& child : node->GetNamespaceNodes())
+            walk(child);
     };
     walk(Network());
     EXPECT_EQ(namespaces, 84);
 }
 
 TEST(Tree, DescriptionsAndCreationOrder) {
-    EXPECT_EQ(Network()->GetDescription(),
-              "Operations that pertain to the maintenance of networking on an Hadro host. This includes a wide "
-              "variety of commands to manipulate virtual networking components (vswitch, portgroup, etc) as well "
-              "as local host IP, DNS and general host networking settings.");
+    EXPECT_EQ(
+        Network()->GetDescription(),
+        "Operations that pertain to the maintenance of networking on an Hadro host. This includes a wide "
+        "variety of commands to manipulate virtual networking components (vswitch, portgroup, etc) as well "
+        "as local host IP, DNS and general host networking settings.");
     // Namespaces without commands of their own carry their descriptions too.
     const std::pair<const char*, const char*> samples[] = {
         {"network ip dns", "Operations pertaining to Domain Name Server configuration."},
@@ -72,14 +75,16 @@ TEST(Tree, DescriptionsAndCreationOrder) {
     auto namespaces = [](const std::shared_ptr<NamespaceNode>& node) {
         std::vector<std::string> names;
         for (const auto& name : node->GetNamespaceNodeNames()) {
-            if (node->GetNamespaceNode(name)->GetType() == Zorbel::AutoCli::NODE_NAMESPACE) names.push_back(name);
+            if (node->GetNamespaceNode(name)->GetType() == Zorbel::AutoCli::NODE_NAMESPACE)
+                names.push_back(name);
         }
         return names;
     };
-    EXPECT_EQ(namespaces(Network()), (std::vector<std::string>{"ip", "multicast", "nic", "sriovnic", "vswitch",
-                                                                "firewall", "port", "vm", "ens"}));
+    EXPECT_EQ(namespaces(Network()), (std::vector<std::string>{"ip", "multicast", "nic", "sriovnic",
+                                                               "vswitch", "firewall", "port", "vm", "ens"}));
     EXPECT_EQ(namespaces(Resolve("network ip")),
-              (std::vector<std::string>{"neighbor", "connection", "dns", "route", "ipsec", "interface", "netstack"}));
+              (std::vector<std::string>{"neighbor", "connection", "dns", "route", "ipsec", "interface",
+                                        "netstack"}));
     EXPECT_EQ(namespaces(Resolve("network vswitch dvs talvex")), (std::vector<std::string>{"lacp"}));
     EXPECT_EQ(namespaces(Resolve("network vswitch dvs talvex lacp")),
               (std::vector<std::string>{"config", "status", "stats", "timeout"}));
@@ -92,7 +97,8 @@ TEST(Tree, PluginExportsOnlyTheEntryPoint) {
     ASSERT_NE(pipe, nullptr);
     std::string out;
     char buffer[256];
-    while (fgets(buffer, sizeof buffer, pipe)) out += buffer;
+    while (fgets(buffer, sizeof buffer, pipe))
+        out += buffer;
     pclose(pipe);
     EXPECT_EQ(out, "AutoCli_RegisterNamespaces\n");
 }

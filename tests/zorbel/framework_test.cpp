@@ -2,9 +2,9 @@
 // help and formatters, in-process and through hadrocli.
 #include <gtest/gtest.h>
 
+#include <sys/wait.h>
 #include <cstdio>
 #include <sstream>
-#include <sys/wait.h>
 
 #include "zorbel/dispatcher.h"
 
@@ -49,19 +49,21 @@ Result Cli(const std::vector<std::string>& args) {
 Result RunProcess(const std::string& arguments) {
     Result result;
     std::string errFile = ::testing::TempDir() + "zorbel_stderr.txt";
-    std::string command = std::string(HADROCLI) + " --plugin-dir=" + TEST_PLUGIN_DIR + " " + arguments + " 2>" + errFile;
+    std::string command =
+        std::string(HADROCLI) + " --plugin-dir=" + TEST_PLUGIN_DIR + " " + arguments + " 2>" + errFile;
     FILE* pipe = popen(command.c_str(), "r");
     char buffer[4096];
     std::size_t n;
-    while ((n = fread(buffer, 1, sizeof buffer, pipe)) > 0) result.out.append(buffer, n);
+    while ((n = fread(buffer, 1, sizeof buffer, pipe)) > 0)
+        result.out.append(buffer, n);
     int status = pclose(pipe);
     result.status = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
     FILE* errPipe = fopen(errFile.c_str(), "r");
-    while (errPipe && (n = fread(buffer, 1, sizeof buffer, errPipe)) > 0) result.err.append(buffer, n);
+    while (errPipe && (n = fread(buffer, 1, sizeof buffer, errPipe)) > 0)
+        result.err.append(buffer, n);
     if (errPipe) fclose(errPipe);
     return result;
 }
-
 
 std::vector<std::string> Show(std::initializer_list<std::string> options) {
     std::vector<std::string> args{"--formatter=json", "test", "types", "show"};
@@ -72,12 +74,13 @@ std::vector<std::string> Show(std::initializer_list<std::string> options) {
 }  // namespace
 
 TEST(CommandLine, EveryTypeAndSyntaxIsParsed) {
-    auto r = Cli(Show({"--name=x y", "-c", "5", "--level", "2", "-C=red", "-i", "tkn255", "--enabled=YES", "-a",
-                       "--item", "a", "-I=b", "--offset", "-9223372036854775808"}));
+    auto r = Cli(Show({"--name=x y", "-c", "5", "--level", "2", "-C=red", "-i", "tkn255", "--enabled=YES",
+                       "-a", "--item", "a", "-I=b", "--offset", "-9223372036854775808"}));
     EXPECT_EQ(r.status, 0) << r.err;
-    EXPECT_EQ(r.out,
-              "{\"name\":\"x y\",\"count\":\"5\",\"level\":\"2\",\"color\":\"red\",\"interface\":\"tkn255\","
-              "\"enabled\":\"true\",\"all\":\"set\",\"offset\":\"-9223372036854775808\",\"item\":[\"a\",\"b\"]}\n");
+    EXPECT_EQ(
+        r.out,
+        "{\"name\":\"x y\",\"count\":\"5\",\"level\":\"2\",\"color\":\"red\",\"interface\":\"tkn255\","
+        "\"enabled\":\"true\",\"all\":\"set\",\"offset\":\"-9223372036854775808\",\"item\":[\"a\",\"b\"]}\n");
     EXPECT_EQ(r.err, "");
 
     // Absent parameters read as empty, 0, false, unset; booleans take every spelling.
@@ -102,11 +105,13 @@ TEST(CommandLine, RefusalsNameTheOptionAndRunNothing) {
         {{"--name"}, "Error: option --name needs a value"},
         {{"--name", "--count=1"}, "Error: option --name needs a value"},
         {{"stray"}, "Error: unexpected argument 'stray'"},
-        {{"--count", "99999999999999999999"}, "Error: option --count: '99999999999999999999' does not fit in a 64-bit integer"},
+        {{"--count", "99999999999999999999"},
+         "Error: option --count: '99999999999999999999' does not fit in a 64-bit integer"},
         {{"--offset", "12x"}, "Error: option --offset: '12x' is not an integer"},
         {{"--offset="}, "Error: option --offset: '' is not an integer"},
         {{"--offset", " 1"}, "Error: option --offset: ' 1' is not an integer"},
-        {{"--enabled=maybe"}, "Error: option --enabled: 'maybe' is not a boolean (use true/false, yes/no, on/off or 1/0)"},
+        {{"--enabled=maybe"},
+         "Error: option --enabled: 'maybe' is not a boolean (use true/false, yes/no, on/off or 1/0)"},
         {{"--count", "11"}, "Error: option --count: 11 is not within the range 1 to 10"},
         {{"-c", "0"}, "Error: option --count: 0 is not within the range 1 to 10"},
         {{"--level", "4"}, "Error: option --level: 4 is not one of the allowed values: 1, 2, 3"},
@@ -127,7 +132,10 @@ TEST(CommandLine, RefusalsNameTheOptionAndRunNothing) {
         r = Cli(args);
         EXPECT_EQ(r.status, EXIT_REFUSED) << c.message;
         EXPECT_EQ(r.out, "");
-        EXPECT_EQ(r.err, c.message + "\nUsage: hadrocli test types show [options]; see 'hadrocli test types show --help'.\n");
+        EXPECT_EQ(
+            r.err,
+            c.message +
+                "\nUsage: hadrocli test types show [options]; see 'hadrocli test types show --help'.\n");
     }
     auto r = Cli({"test", "types", "set", "--value", "3"});
     EXPECT_EQ(r.status, EXIT_REFUSED);
@@ -138,26 +146,29 @@ TEST(CommandLine, PathsNamespacesAndGlobalOptions) {
     auto r = Cli({"test", "nothing"});
     EXPECT_EQ(r.status, EXIT_REFUSED);
     EXPECT_EQ(r.err,
-              "Error: Unknown command or namespace 'nothing' in 'test'. Valid choices: types, record, scalar, fail.\n"
+              "Error: Unknown command or namespace 'nothing' in 'test'. Valid choices: types, record, "
+              "scalar, fail.\n"
               "Usage: hadrocli test [options]; see 'hadrocli test --help'.\n");
 
     // A path that ends at a namespace lists it: exit 0 with --help, else 2.
     r = Cli({"test", "types", "--help"});
     EXPECT_EQ(r.status, 0);
-    EXPECT_EQ(r.out,
-              "Usage: hadrocli test types {cmd} [cmd options]\n\nDescription:\n  Parameter types.\n\n"
-              "Available Commands:\n  show   Show the parsed value of every parameter.\n  set    Needs a name.\n");
+    EXPECT_EQ(
+        r.out,
+        "Usage: hadrocli test types {cmd} [cmd options]\n\nDescription:\n  Parameter types.\n\n"
+        "Available Commands:\n  show   Show the parsed value of every parameter.\n  set    Needs a name.\n");
     r = Cli({"test", "types"});
     EXPECT_EQ(r.status, EXIT_REFUSED);
     EXPECT_EQ(r.out, "");
     EXPECT_NE(r.err.find("Available Commands:"), std::string::npos);
 
     r = Cli({"--formatter=json", "test", "--help"});
-    EXPECT_EQ(r.out,
-              "{\"path\":\"test\",\"description\":\"Commands that exercise the framework.\",\"namespaces\":["
-              "{\"name\":\"types\",\"description\":\"Parameter types.\"},{\"name\":\"record\",\"description\":"
-              "\"Records.\"},{\"name\":\"scalar\",\"description\":\"Scalars.\"},{\"name\":\"fail\",\"description\":"
-              "\"Failures.\"}],\"commands\":[]}\n");
+    EXPECT_EQ(
+        r.out,
+        "{\"path\":\"test\",\"description\":\"Commands that exercise the framework.\",\"namespaces\":["
+        "{\"name\":\"types\",\"description\":\"Parameter types.\"},{\"name\":\"record\",\"description\":"
+        "\"Records.\"},{\"name\":\"scalar\",\"description\":\"Scalars.\"},{\"name\":\"fail\",\"description\":"
+        "\"Failures.\"}],\"commands\":[]}\n");
 
     r = Cli({"--formatter=xmlish", "test"});
     EXPECT_EQ(r.status, EXIT_REFUSED);
@@ -170,7 +181,8 @@ TEST(CommandLine, PathsNamespacesAndGlobalOptions) {
     EXPECT_NE(r.err.find("Usage: hadrocli [global options]"), std::string::npos);
     r = Cli({"--help"});
     EXPECT_EQ(r.status, 0);
-    EXPECT_NE(r.out.find("Available Namespaces:\n  test   Commands that exercise the framework.\n"), std::string::npos);
+    EXPECT_NE(r.out.find("Available Namespaces:\n  test   Commands that exercise the framework.\n"),
+              std::string::npos);
 }
 
 TEST(CommandLine, ListCommandsInRegistrationOrder) {
@@ -181,7 +193,9 @@ TEST(CommandLine, ListCommandsInRegistrationOrder) {
               "test types set\tNeeds a name.\n");
     EXPECT_NE(r.out.find("test fail plain\tDerived without a virtual base.\n"), std::string::npos);
     r = Cli({"--formatter=json", "--list-commands"});
-    EXPECT_EQ(r.out.rfind("[{\"path\":\"test types show\",\"description\":\"Show the parsed value of every", 0), 0u);
+    EXPECT_EQ(
+        r.out.rfind("[{\"path\":\"test types show\",\"description\":\"Show the parsed value of every", 0),
+        0u);
     EXPECT_EQ(r.out.substr(r.out.size() - 3), "}]\n");
 }
 
@@ -205,22 +219,29 @@ TEST(Help, CommandHelpAsTextAndJson) {
     r = Cli({"--formatter=json", "test", "types", "set", "--help"});
     EXPECT_EQ(r.out,
               "{\"path\":\"test types set\",\"description\":\"Needs a name.\",\"parameters\":["
-              "{\"name\":\"name\",\"short\":\"n\",\"type\":\"string\",\"required\":true,\"description\":\"The name.\"},"
-              "{\"name\":\"value\",\"short\":\"v\",\"type\":\"integer\",\"required\":false,\"description\":\"The value.\"}"
+              "{\"name\":\"name\",\"short\":\"n\",\"type\":\"string\",\"required\":true,\"description\":"
+              "\"The name.\"},"
+              "{\"name\":\"value\",\"short\":\"v\",\"type\":\"integer\",\"required\":false,\"description\":"
+              "\"The value.\"}"
               "],\"output\":{\"kind\":\"boolean\"},\"metadata\":{\"type\":\"operation\"},\"formatter\":\"\","
               "\"output-parameters\":[]}\n");
     r = Cli({"--formatter=json", "test", "types", "show", "--help"});
     for (const char* piece : {
-             "{\"name\":\"count\",\"short\":\"c\",\"type\":\"integer\",\"required\":false,\"description\":\"A count.\","
+             "{\"name\":\"count\",\"short\":\"c\",\"type\":\"integer\",\"required\":false,\"description\":"
+             "\"A count.\","
              "\"constraint\":{\"kind\":\"range\",\"min\":1,\"max\":10}}",
              "\"description\":\"Level : [1, 2, 3]\",\"constraint\":{\"kind\":\"enum\",\"values\":[1,2,3]}}",
-             "\"description\":\"Colour. Available colours are \\n    red: The colour red\\n    blue\",\"constraint\":"
-             "{\"kind\":\"enum\",\"values\":[{\"value\":\"red\",\"help\":\"The colour red\"},{\"value\":\"blue\","
+             "\"description\":\"Colour. Available colours are \\n    red: The colour red\\n    "
+             "blue\",\"constraint\":"
+             "{\"kind\":\"enum\",\"values\":[{\"value\":\"red\",\"help\":\"The colour "
+             "red\"},{\"value\":\"blue\","
              "\"help\":\"\"}]}}",
-             "\"constraint\":{\"kind\":\"regex\",\"pattern\":\"tkn([0-9]|[1-9][0-9]|1[0-9][0-9]|2[0-4][0-9]|25[0-5])\"}}",
+             "\"constraint\":{\"kind\":\"regex\",\"pattern\":\"tkn([0-9]|[1-9][0-9]|1[0-9][0-9]|2[0-4][0-9]|"
+             "25[0-5])\"}}",
              "{\"name\":\"all\",\"short\":\"a\",\"type\":\"flag\"",
              "{\"name\":\"item\",\"short\":\"I\",\"type\":\"string-list\"",
-             "\"output\":{\"kind\":\"record\",\"record\":\"Parsed\",\"fields\":[{\"name\":\"name\",\"type\":\"string\"}",
+             "\"output\":{\"kind\":\"record\",\"record\":\"Parsed\",\"fields\":[{\"name\":\"name\",\"type\":"
+             "\"string\"}",
              "{\"name\":\"item\",\"type\":\"string-list\"}]}",
          }) {
         EXPECT_NE(r.out.find(piece), std::string::npos) << piece << "\n" << r.out;
@@ -249,9 +270,10 @@ TEST(Formatters, SimpleRecordWithNestedValuesAndUnits) {
 
 TEST(Formatters, SimpleListWithHeadingsAndChosenFields) {
     auto r = Cli({"test", "record", "list"});
-    EXPECT_EQ(r.out,
-              "alpha\n   Name: alpha\n   MTU: 1400 bytes\n   Enabled: false\n   Servers: 10.0.0.1, 10.0.0.2\n\n"
-              "b\n   Name: b\n   MTU: 1500 bytes\n   Enabled: false\n   Servers: 10.0.0.1, 10.0.0.2\n");
+    EXPECT_EQ(
+        r.out,
+        "alpha\n   Name: alpha\n   MTU: 1400 bytes\n   Enabled: false\n   Servers: 10.0.0.1, 10.0.0.2\n\n"
+        "b\n   Name: b\n   MTU: 1500 bytes\n   Enabled: false\n   Servers: 10.0.0.1, 10.0.0.2\n");
     // An empty list is a valid result and prints nothing.
     r = Cli({"test", "record", "list", "--count", "0"});
     EXPECT_EQ(r.status, 0);
@@ -345,7 +367,8 @@ TEST(Plugins, ABrokenPluginBesideAGoodOne) {
     std::ostringstream err;
     EXPECT_EQ(dispatcher->LoadPluginDirectories({TEST_PLUGIN_DIR, "/nonexistent"}, err), 1);
     std::string text = err.str();
-    EXPECT_NE(text.find("Warning: plug-in " TEST_PLUGIN_DIR "/garbage.so not loaded: "), std::string::npos) << text;
+    EXPECT_NE(text.find("Warning: plug-in " TEST_PLUGIN_DIR "/garbage.so not loaded: "), std::string::npos)
+        << text;
     EXPECT_NE(text.find("Warning: plug-in " TEST_PLUGIN_DIR "/no_entry.so not loaded: it has no entry point "
                         "AutoCli_RegisterNamespaces\n"),
               std::string::npos)

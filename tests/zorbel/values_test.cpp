@@ -61,8 +61,8 @@ public:
     std::shared_ptr<Zorbel::CallSpec::OutputSpec> GetOutputSpecInternal() override {
         return Zorbel::CallSpec::OutputSpec::New();
     }
-    void ExecuteInternal(std::shared_ptr<Zorbel::CallSpec::Input>, std::shared_ptr<Zorbel::CallSpec::Output>) override {
-    }
+    void ExecuteInternal(std::shared_ptr<Zorbel::CallSpec::Input>,
+                         std::shared_ptr<Zorbel::CallSpec::Output>) override {}
 };
 }  // namespace
 

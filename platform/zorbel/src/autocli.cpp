@@ -6,9 +6,13 @@ namespace Zorbel::AutoCli {
 
 NamespaceNode::~NamespaceNode() = default;
 
-std::shared_ptr<NamespaceNode> NamespaceNode::GetThis() { return shared_from_this(); }
+std::shared_ptr<NamespaceNode> NamespaceNode::GetThis() {
+    return shared_from_this();
+}
 
-NodeType NamespaceNode::GetType() const { return NODE_NAMESPACE; }
+NodeType NamespaceNode::GetType() const {
+    return NODE_NAMESPACE;
+}
 
 std::list<std::string> NamespaceNode::GetPath() {
     std::list<std::string> path;
@@ -31,19 +35,23 @@ std::string NamespaceNode::GetPathString(char separator) {
     return text;
 }
 
-bool NamespaceNode::HasNamespaceNode(const std::string& name) { return GetNamespaceNode(name) != nullptr; }
+bool NamespaceNode::HasNamespaceNode(const std::string& name) {
+    return GetNamespaceNode(name) != nullptr;
+}
 
 std::vector<std::string> NamespaceNode::GetNamespaceNodeNames() {
     std::vector<std::string> names;
     names.reserve(children_.size());
-    for (const auto& child : children_) names.push_back(child.first);
+    for (const auto& child : children_)
+        names.push_back(child.first);
     return names;
 }
 
 std::vector<std::shared_ptr<NamespaceNode>> NamespaceNode::GetNamespaceNodes() {
     std::vector<std::shared_ptr<NamespaceNode>> nodes;
     nodes.reserve(children_.size());
-    for (const auto& child : children_) nodes.push_back(child.second);
+    for (const auto& child : children_)
+        nodes.push_back(child.second);
     return nodes;
 }
 
@@ -97,16 +105,28 @@ std::shared_ptr<Dispatcher> NamespaceNode::GetDispatcher() {
     return parent ? parent->GetDispatcher() : nullptr;
 }
 
-void NamespaceNode::SetParent(std::shared_ptr<NamespaceNode> parent) { parent_ = parent; }
+void NamespaceNode::SetParent(std::shared_ptr<NamespaceNode> parent) {
+    parent_ = parent;
+}
 
-std::shared_ptr<NamespaceNode> NamespaceNode::GetParent() { return parent_.lock(); }
+std::shared_ptr<NamespaceNode> NamespaceNode::GetParent() {
+    return parent_.lock();
+}
 
-void NamespaceNode::SetDescription(const char* description) { description_ = description ? description : ""; }
-void NamespaceNode::SetDescription(std::string description) { description_ = std::move(description); }
+void NamespaceNode::SetDescription(const char* description) {
+    description_ = description ? description : "";
+}
+void NamespaceNode::SetDescription(std::string description) {
+    description_ = std::move(description);
+}
 
-std::shared_ptr<Namespace> Namespace::New() { return std::make_shared<Namespace>(); }
+std::shared_ptr<Namespace> Namespace::New() {
+    return std::make_shared<Namespace>();
+}
 
-NodeType CommandSpec::GetType() const { return NODE_COMMAND; }
+NodeType CommandSpec::GetType() const {
+    return NODE_COMMAND;
+}
 
 void CommandSpec::SetMetaDataField(const std::string& key, const std::string& value) {
     for (auto& entry : metadata_) {
@@ -125,7 +145,9 @@ std::string CommandSpec::GetMetaDataField(const std::string& key) const {
     return {};
 }
 
-void CommandSpec::SetDefaultOutputFormatter(const std::string& name) { formatter_ = name; }
+void CommandSpec::SetDefaultOutputFormatter(const std::string& name) {
+    formatter_ = name;
+}
 
 void CommandSpec::SetDefaultOutputParameter(const std::string& key, const std::string& value) {
     for (auto& entry : outputParameters_) {
@@ -140,10 +162,18 @@ void CommandSpec::SetDefaultOutputParameter(const std::string& key, const std::s
 Command::Command() = default;
 Command::~Command() = default;
 
-std::shared_ptr<CallSpec::InputSpec> Command::GetInputSpec() { return GetInputSpecInternal(); }
-std::shared_ptr<CallSpec::OutputSpec> Command::GetOutputSpec() { return GetOutputSpecInternal(); }
-std::shared_ptr<NamespaceNode> Command::GetThis() { return NamespaceNode::GetThis(); }
-NodeType Command::GetType() const { return NODE_COMMAND; }
+std::shared_ptr<CallSpec::InputSpec> Command::GetInputSpec() {
+    return GetInputSpecInternal();
+}
+std::shared_ptr<CallSpec::OutputSpec> Command::GetOutputSpec() {
+    return GetOutputSpecInternal();
+}
+std::shared_ptr<NamespaceNode> Command::GetThis() {
+    return NamespaceNode::GetThis();
+}
+NodeType Command::GetType() const {
+    return NODE_COMMAND;
+}
 
 void Command::Execute(std::shared_ptr<CallSpec::Input> input, std::shared_ptr<CallSpec::Output> output) {
     ExecuteInternal(std::move(input), std::move(output));

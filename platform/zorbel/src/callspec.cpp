@@ -6,11 +6,16 @@ namespace Zorbel::CallSpec {
 
 const char* ParameterTypeName(ParameterType type) {
     switch (type) {
-        case PARAM_STRING: return "string";
-        case PARAM_INT: return "integer";
-        case PARAM_BOOL: return "boolean";
-        case PARAM_FLAG: return "flag";
-        case PARAM_STRING_LIST: return "string-list";
+        case PARAM_STRING:
+            return "string";
+        case PARAM_INT:
+            return "integer";
+        case PARAM_BOOL:
+            return "boolean";
+        case PARAM_FLAG:
+            return "flag";
+        case PARAM_STRING_LIST:
+            return "string-list";
     }
     return "unknown";
 }
@@ -26,11 +31,15 @@ void ParameterConstraint::SetIntRange(long low, long high) {
     low_ = low;
     high_ = high;
 }
-void ParameterConstraint::AddIntEnum(long value) { intEnum_.push_back(value); }
+void ParameterConstraint::AddIntEnum(long value) {
+    intEnum_.push_back(value);
+}
 void ParameterConstraint::AddStringEnum(const std::string& value, const std::string& help) {
     stringEnum_.push_back({value, help});
 }
-void ParameterConstraint::SetStringRegex(const std::string& pattern) { regex_ = pattern; }
+void ParameterConstraint::SetStringRegex(const std::string& pattern) {
+    regex_ = pattern;
+}
 
 std::shared_ptr<ParameterSpec> ParameterSpec::New(const std::string& name, ParameterType type) {
     return std::make_shared<ParameterSpec>(name, type);
@@ -39,11 +48,21 @@ std::shared_ptr<ParameterSpec> ParameterSpec::New(const std::string& name, int t
     return New(name, static_cast<ParameterType>(type));
 }
 
-void ParameterSpec::SetShortName(const char* shortName) { shortName_ = shortName ? shortName : ""; }
-void ParameterSpec::SetShortName(const std::string& shortName) { shortName_ = shortName; }
-void ParameterSpec::SetShortName(char shortName) { shortName_ = std::string(1, shortName); }
-void ParameterSpec::SetDescription(const char* description) { description_ = description ? description : ""; }
-void ParameterSpec::SetDescription(std::string description) { description_ = std::move(description); }
+void ParameterSpec::SetShortName(const char* shortName) {
+    shortName_ = shortName ? shortName : "";
+}
+void ParameterSpec::SetShortName(const std::string& shortName) {
+    shortName_ = shortName;
+}
+void ParameterSpec::SetShortName(char shortName) {
+    shortName_ = std::string(1, shortName);
+}
+void ParameterSpec::SetDescription(const char* description) {
+    description_ = description ? description : "";
+}
+void ParameterSpec::SetDescription(std::string description) {
+    description_ = std::move(description);
+}
 
 bool ParameterSpec::SameAs(const ParameterSpec& other) const {
     if (name_ != other.name_ || type_ != other.type_ || shortName_ != other.shortName_ ||
@@ -53,7 +72,9 @@ bool ParameterSpec::SameAs(const ParameterSpec& other) const {
     return *constraint_ == *other.constraint_;
 }
 
-std::shared_ptr<InputSpec> InputSpec::New() { return std::make_shared<InputSpec>(); }
+std::shared_ptr<InputSpec> InputSpec::New() {
+    return std::make_shared<InputSpec>();
+}
 
 void InputSpec::AddParameter(std::shared_ptr<ParameterSpec> parameter) {
     if (parameter) parameters_.push_back(std::move(parameter));
@@ -72,11 +93,17 @@ std::shared_ptr<ParameterSpec> InputSpec::FindShortParameter(const std::string& 
     return it == parameters_.end() ? nullptr : *it;
 }
 
-std::shared_ptr<OutputSpec> OutputSpec::New() { return std::make_shared<OutputSpec>(); }
+std::shared_ptr<OutputSpec> OutputSpec::New() {
+    return std::make_shared<OutputSpec>();
+}
 
-std::shared_ptr<Input> Input::New() { return std::make_shared<Input>(); }
+std::shared_ptr<Input> Input::New() {
+    return std::make_shared<Input>();
+}
 
-bool Input::HasParameter(const std::string& name) const { return values_.count(name) != 0; }
+bool Input::HasParameter(const std::string& name) const {
+    return values_.count(name) != 0;
+}
 
 const std::string& Input::GetParameter(const std::string& name) const {
     static const std::string empty;
@@ -109,7 +136,9 @@ bool Input::IsFlagSet(const std::string& name) const {
     return it != values_.end() && it->second.boolValue;
 }
 
-void Input::SetString(const std::string& name, std::string text) { values_[name].text = std::move(text); }
+void Input::SetString(const std::string& name, std::string text) {
+    values_[name].text = std::move(text);
+}
 
 void Input::SetInt(const std::string& name, std::string text, std::int64_t value) {
     auto& v = values_[name];
@@ -135,7 +164,9 @@ void Input::AppendListValue(const std::string& name, std::string text) {
     v.list.push_back(std::move(text));
 }
 
-std::shared_ptr<Output> Output::New() { return std::make_shared<Output>(); }
+std::shared_ptr<Output> Output::New() {
+    return std::make_shared<Output>();
+}
 
 CallTarget::~CallTarget() = default;
 

@@ -8,9 +8,9 @@
 #include <exception>
 #include <ostream>
 
-#include "zorbel/formatter.h"
 #include "help.h"
 #include "options.h"
+#include "zorbel/formatter.h"
 
 #ifndef HADRO_VERSION
 #define HADRO_VERSION "0.0.0"
@@ -20,7 +20,9 @@ namespace Zorbel::AutoCli {
 
 namespace {
 
-bool StartsWith(const std::string& text, const char* prefix) { return text.rfind(prefix, 0) == 0; }
+bool StartsWith(const std::string& text, const char* prefix) {
+    return text.rfind(prefix, 0) == 0;
+}
 
 // Reads "--name=value" or "--name value" for a global option; true when arg is that option.
 bool TakeGlobalValue(const std::vector<std::string>& args, std::size_t& i, const std::string& name,
@@ -69,7 +71,8 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
             if (!Format::IsFormatter(value)) {
                 error = "unknown formatter '" + value + "' for --formatter (choose from ";
                 const auto& names = Format::FormatterNames();
-                for (std::size_t k = 0; k < names.size(); ++k) error += (k ? ", " : "") + names[k];
+                for (std::size_t k = 0; k < names.size(); ++k)
+                    error += (k ? ", " : "") + names[k];
                 error += ")";
                 return false;
             }
@@ -211,8 +214,8 @@ int Dispatcher::StatusOf(const CallSpec::Output& output) {
     return EXIT_OK;
 }
 
-Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalOptions& options, std::ostream& out,
-                             std::ostream& err) {
+Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalOptions& options,
+                             std::ostream& out, std::ostream& err) {
     Prepared result;
     const bool json = options.formatter == "json";
     if (options.version) {
@@ -246,8 +249,7 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         }
     }
     std::vector<std::string> rest(args.begin() + static_cast<std::ptrdiff_t>(i), args.end());
-    const bool helpAsked =
-        options.help || std::find(rest.begin(), rest.end(), "--help") != rest.end();
+    const bool helpAsked = options.help || std::find(rest.begin(), rest.end(), "--help") != rest.end();
 
     if (node->GetType() != NODE_COMMAND) {
         bool help = helpAsked || std::find(rest.begin(), rest.end(), "-h") != rest.end();
@@ -264,7 +266,8 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
             err << "Error: '" << (node == root_ ? programName_ : node->GetPathString(' '))
                 << "' is a namespace, not a command; " << rest.front() << " is not valid here.\n";
         }
-        err << (node == root_ ? Help::ProgramUsage(programName_, *node) : Help::NamespaceText(programName_, *node));
+        err << (node == root_ ? Help::ProgramUsage(programName_, *node)
+                              : Help::NamespaceText(programName_, *node));
         result.status = EXIT_REFUSED;
         return result;
     }
@@ -279,8 +282,8 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
     if (!inputSpec) inputSpec = CallSpec::InputSpec::New();
     const std::string path = command->GetPathString(' ');
 
-    bool shortHelp = !inputSpec->FindShortParameter("h") &&
-                     std::find(rest.begin(), rest.end(), "-h") != rest.end();
+    bool shortHelp =
+        !inputSpec->FindShortParameter("h") && std::find(rest.begin(), rest.end(), "-h") != rest.end();
     if (helpAsked || shortHelp) {
         auto outputSpec = command->GetOutputSpec();
         out << (json ? Help::CommandJson(path, *command, *inputSpec, outputSpec.get())
@@ -318,7 +321,8 @@ int Dispatcher::Execute(const Invocation& invocation, const GlobalOptions& optio
             if (formatter.empty()) formatter = invocation.command->GetDefaultOutputFormatter();
             if (!Format::IsFormatter(formatter)) formatter = "simple";
             Format::OutputParameters parameters(invocation.command->GetDefaultOutputParameters());
-            for (const auto& [key, value] : options.formatParameters) parameters.Set(key, value);
+            for (const auto& [key, value] : options.formatParameters)
+                parameters.Set(key, value);
             Format::Render(formatter, *root, parameters, rendered);
         }
     } catch (const std::exception& e) {

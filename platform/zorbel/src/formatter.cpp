@@ -140,7 +140,8 @@ public:
         std::vector<const MetaStruct::Field*> shown;
         const auto& fields = record.GetFields();
         if (!list) {
-            for (const auto& field : fields) shown.push_back(&field);
+            for (const auto& field : fields)
+                shown.push_back(&field);
             return shown;
         }
         std::size_t start = 0;
@@ -149,8 +150,7 @@ public:
             if (comma == std::string::npos) comma = list->size();
             std::string wanted = list->substr(start, comma - start);
             for (const auto& field : fields) {
-                if (field.first == wanted &&
-                    std::find(shown.begin(), shown.end(), &field) == shown.end()) {
+                if (field.first == wanted && std::find(shown.begin(), shown.end(), &field) == shown.end()) {
                     shown.push_back(&field);
                     break;
                 }
@@ -202,9 +202,12 @@ public:
     std::string Plain(const MetaObject* value) const {
         if (!value) return {};
         switch (value->GetType()) {
-            case MetaObj::META_STRING: return Display(static_cast<const MetaString*>(value)->Get());
-            case MetaObj::META_INT: return std::to_string(static_cast<const MetaInt*>(value)->Get());
-            case MetaObj::META_BOOL: return static_cast<const MetaBool*>(value)->Get() ? "true" : "false";
+            case MetaObj::META_STRING:
+                return Display(static_cast<const MetaString*>(value)->Get());
+            case MetaObj::META_INT:
+                return std::to_string(static_cast<const MetaInt*>(value)->Get());
+            case MetaObj::META_BOOL:
+                return static_cast<const MetaBool*>(value)->Get() ? "true" : "false";
             case MetaObj::META_LIST: {
                 const auto* list = static_cast<const MetaList*>(value);
                 std::string text;
@@ -224,7 +227,8 @@ public:
                 for (const auto* field : ShownFields(*record)) {
                     if (!first) text += ", ";
                     first = false;
-                    text += field->first + ": " + Scalar(field->second.get(), record->GetName(), field->first);
+                    text +=
+                        field->first + ": " + Scalar(field->second.get(), record->GetName(), field->first);
                 }
                 return text;
             }
@@ -251,7 +255,8 @@ bool IsRecordList(const MetaObject* value) {
 
 class SimpleWriter {
 public:
-    SimpleWriter(const OutputParameters& parameters, std::string& out) : layout_(parameters, false), out_(out) {}
+    SimpleWriter(const OutputParameters& parameters, std::string& out)
+        : layout_(parameters, false), out_(out) {}
 
     void Root(const MetaObject& root) {
         switch (root.GetType()) {
@@ -349,7 +354,8 @@ int TerminalColumns(const OutputParameters& parameters) {
 
 class TableWriter {
 public:
-    TableWriter(const OutputParameters& parameters, std::string& out) : layout_(parameters, true), out_(out) {}
+    TableWriter(const OutputParameters& parameters, std::string& out)
+        : layout_(parameters, true), out_(out) {}
 
     void Root(const MetaObject& root) {
         if (root.GetType() == MetaObj::META_STRUCT) {
@@ -375,7 +381,8 @@ private:
         if (records.empty()) return;
         // The columns are those of the first record; a later record's cell is looked up by name.
         std::vector<std::string> columns;
-        for (const auto* field : layout_.ShownFields(*records.front())) columns.push_back(field->first);
+        for (const auto* field : layout_.ShownFields(*records.front()))
+            columns.push_back(field->first);
         if (columns.empty()) return;
         const std::string& recordName = records.front()->GetName();
 
@@ -394,12 +401,14 @@ private:
         std::vector<std::size_t> widths(columns.size());
         for (std::size_t i = 0; i < columns.size(); ++i) {
             widths[i] = DisplayWidth(columns[i]);
-            for (const auto& row : rows) widths[i] = std::max(widths[i], DisplayWidth(row[i]));
+            for (const auto& row : rows)
+                widths[i] = std::max(widths[i], DisplayWidth(row[i]));
         }
 
         bool wrapLast = layout_.parameters().Get("wrap-last").value_or("") == "true";
         std::size_t lastStart = 0;
-        for (std::size_t i = 0; i + 1 < columns.size(); ++i) lastStart += widths[i] + 2;
+        for (std::size_t i = 0; i + 1 < columns.size(); ++i)
+            lastStart += widths[i] + 2;
         std::size_t lastWidth = widths.back();
         if (wrapLast) {
             std::size_t total = static_cast<std::size_t>(TerminalColumns(layout_.parameters()));
@@ -415,11 +424,12 @@ private:
         }
         Row(columns, widths, lastStart, lastWidth, false);
         Row(dashes, widths, lastStart, lastWidth, false);
-        for (const auto& row : rows) Row(row, widths, lastStart, lastWidth, wrapLast);
+        for (const auto& row : rows)
+            Row(row, widths, lastStart, lastWidth, wrapLast);
     }
 
-    void Row(const std::vector<std::string>& cells, const std::vector<std::size_t>& widths, std::size_t lastStart,
-             std::size_t lastWidth, bool wrap) {
+    void Row(const std::vector<std::string>& cells, const std::vector<std::size_t>& widths,
+             std::size_t lastStart, std::size_t lastWidth, bool wrap) {
         std::string line;
         for (std::size_t i = 0; i + 1 < cells.size(); ++i) {
             line += cells[i];
@@ -434,7 +444,8 @@ private:
         for (std::size_t i = 0; i < last.size(); ++i) {
             std::string text = i == 0 ? line : std::string(lastStart, ' ');
             text += last[i];
-            while (!text.empty() && text.back() == ' ') text.pop_back();
+            while (!text.empty() && text.back() == ' ')
+                text.pop_back();
             out_ += text;
             out_ += '\n';
         }
@@ -456,13 +467,27 @@ void AppendJsonString(std::string& out, const std::string& text) {
         unsigned char c = bytes[i];
         if (c < 0x80) {
             switch (c) {
-                case '"': out += "\\\""; break;
-                case '\\': out += "\\\\"; break;
-                case '\n': out += "\\n"; break;
-                case '\r': out += "\\r"; break;
-                case '\t': out += "\\t"; break;
-                case '\b': out += "\\b"; break;
-                case '\f': out += "\\f"; break;
+                case '"':
+                    out += "\\\"";
+                    break;
+                case '\\':
+                    out += "\\\\";
+                    break;
+                case '\n':
+                    out += "\\n";
+                    break;
+                case '\r':
+                    out += "\\r";
+                    break;
+                case '\t':
+                    out += "\\t";
+                    break;
+                case '\b':
+                    out += "\\b";
+                    break;
+                case '\f':
+                    out += "\\f";
+                    break;
                 default:
                     if (c < 0x20 || c == 0x7f) {
                         out += "\\u00";

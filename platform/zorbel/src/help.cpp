@@ -38,7 +38,8 @@ std::string Indented(const std::string& text, std::size_t indent) {
 // "  name   description" rows with the descriptions aligned and wrapped.
 std::string Listing(const std::vector<std::pair<std::string, std::string>>& rows) {
     std::size_t nameWidth = 0;
-    for (const auto& row : rows) nameWidth = std::max(nameWidth, row.first.size());
+    for (const auto& row : rows)
+        nameWidth = std::max(nameWidth, row.first.size());
     std::string out;
     const std::size_t column = 2 + nameWidth + 3;
     for (const auto& [name, description] : rows) {
@@ -48,7 +49,8 @@ std::string Listing(const std::vector<std::pair<std::string, std::string>>& rows
         auto lines = Format::WrapText(description, width);
         for (std::size_t i = 0; i < lines.size(); ++i) {
             std::string line = (i == 0 ? head : std::string(column, ' ')) + lines[i];
-            while (!line.empty() && line.back() == ' ') line.pop_back();
+            while (!line.empty() && line.back() == ' ')
+                line.pop_back();
             out += line;
             out += '\n';
         }
@@ -60,15 +62,18 @@ std::string Children(NamespaceNode& node, bool commands) {
     std::vector<std::pair<std::string, std::string>> rows;
     for (const auto& name : node.GetNamespaceNodeNames()) {
         auto child = node.GetNamespaceNode(name);
-        if ((child->GetType() == AutoCli::NODE_COMMAND) == commands) rows.emplace_back(name, child->GetDescription());
+        if ((child->GetType() == AutoCli::NODE_COMMAND) == commands)
+            rows.emplace_back(name, child->GetDescription());
     }
     return Listing(rows);
 }
 
 std::string EnumValues(const ParameterConstraint& constraint) {
     std::string values;
-    for (const auto& entry : constraint.GetStringEnum()) values += (values.empty() ? "" : ", ") + entry.value;
-    for (long value : constraint.GetIntEnum()) values += (values.empty() ? "" : ", ") + std::to_string(value);
+    for (const auto& entry : constraint.GetStringEnum())
+        values += (values.empty() ? "" : ", ") + entry.value;
+    for (long value : constraint.GetIntEnum())
+        values += (values.empty() ? "" : ", ") + std::to_string(value);
     return values;
 }
 
@@ -96,13 +101,18 @@ void AppendChildrenJson(std::string& out, NamespaceNode& node, bool commands) {
 const char* ValueTypeName(const MetaObject* value) {
     if (!value) return "none";
     switch (value->GetType()) {
-        case MetaObj::META_STRING: return "string";
-        case MetaObj::META_INT: return "integer";
-        case MetaObj::META_BOOL: return "boolean";
-        case MetaObj::META_STRUCT: return "record";
+        case MetaObj::META_STRING:
+            return "string";
+        case MetaObj::META_INT:
+            return "integer";
+        case MetaObj::META_BOOL:
+            return "boolean";
+        case MetaObj::META_STRUCT:
+            return "record";
         case MetaObj::META_LIST:
-            return static_cast<const MetaList*>(value)->GetElementType() == MetaObj::META_STRUCT ? "list"
-                                                                                                  : "string-list";
+            return static_cast<const MetaList*>(value)->GetElementType() == MetaObj::META_STRUCT
+                       ? "list"
+                       : "string-list";
     }
     return "none";
 }
@@ -111,7 +121,8 @@ const char* ValueTypeName(const MetaObject* value) {
 const MetaStruct* RecordOf(const MetaObject* value) {
     if (!value) return nullptr;
     if (value->GetType() == MetaObj::META_STRUCT) return static_cast<const MetaStruct*>(value);
-    if (value->GetType() == MetaObj::META_LIST) return static_cast<const MetaList*>(value)->GetPrototype().get();
+    if (value->GetType() == MetaObj::META_LIST)
+        return static_cast<const MetaList*>(value)->GetPrototype().get();
     return nullptr;
 }
 
@@ -157,10 +168,15 @@ std::string OutputText(const CallSpec::OutputSpec* output) {
     std::string out;
     if (!root) return "  none\n";
     switch (root->GetType()) {
-        case MetaObj::META_BOOL: return "  boolean (true on success)\n";
-        case MetaObj::META_INT: return "  integer\n";
-        case MetaObj::META_STRING: return "  string\n";
-        case MetaObj::META_STRUCT: out = "  record " + static_cast<const MetaStruct*>(root)->GetName() + "\n"; break;
+        case MetaObj::META_BOOL:
+            return "  boolean (true on success)\n";
+        case MetaObj::META_INT:
+            return "  integer\n";
+        case MetaObj::META_STRING:
+            return "  string\n";
+        case MetaObj::META_STRUCT:
+            out = "  record " + static_cast<const MetaStruct*>(root)->GetName() + "\n";
+            break;
         case MetaObj::META_LIST: {
             const MetaStruct* record = RecordOf(root);
             if (!record) return "  list of strings\n";
@@ -185,7 +201,8 @@ std::string ExpandDescription(const ParameterSpec& parameter) {
             full += "\n    " + entry.value;
             if (!entry.help.empty()) full += ": " + entry.help;
         }
-        for (long value : constraint->GetIntEnum()) full += "\n    " + std::to_string(value);
+        for (long value : constraint->GetIntEnum())
+            full += "\n    " + std::to_string(value);
     }
     ReplaceAll(text, "%FULLENUM%", full);
     ReplaceAll(text, "%ENUM%", "[" + values + "]");
@@ -195,7 +212,8 @@ std::string ExpandDescription(const ParameterSpec& parameter) {
 std::string ValidChoices(NamespaceNode& node) {
     std::string text = "Valid choices: ";
     auto names = node.GetNamespaceNodeNames();
-    for (std::size_t i = 0; i < names.size(); ++i) text += (i ? ", " : "") + names[i];
+    for (std::size_t i = 0; i < names.size(); ++i)
+        text += (i ? ", " : "") + names[i];
     if (names.empty()) text += "none";
     return text + ".";
 }
@@ -210,9 +228,11 @@ std::string ProgramUsage(const std::string& program, NamespaceNode& root) {
     std::string out = "Usage: " + program + " [global options] NAMESPACE... COMMAND [command options]\n\n";
     out += "Global options:\n";
     out += Listing({
-        {"--formatter=NAME", "Output format: simple, table or json (default: the command's own, else simple)."},
+        {"--formatter=NAME",
+         "Output format: simple, table or json (default: the command's own, else simple)."},
         {"--state=PATH", "Host state file (default: $HADRO_STATE, else $XDG_STATE_HOME/hadro/host.json)."},
-        {"--plugin-dir=DIR", "Load plug-ins from DIR (default: $HADRO_PLUGIN_PATH, else the installed ones)."},
+        {"--plugin-dir=DIR",
+         "Load plug-ins from DIR (default: $HADRO_PLUGIN_PATH, else the installed ones)."},
         {"--list-commands", "List every command with its description."},
         {"--help, -h", "Show this help; after a namespace or command, its help."},
         {"--version", "Show the version."},
@@ -269,18 +289,24 @@ std::string CommandText(const std::string& program, const std::string& path, con
         if (const auto& constraint = parameter->GetConstraint()) {
             const bool listed = parameter->GetDescription().find("ENUM%") != std::string::npos;
             switch (constraint->GetType()) {
-                case CallSpec::CONSTRAINT_INT_RANGE: notes.push_back(RangeText(*constraint)); break;
+                case CallSpec::CONSTRAINT_INT_RANGE:
+                    notes.push_back(RangeText(*constraint));
+                    break;
                 case CallSpec::CONSTRAINT_INT_ENUM:
                 case CallSpec::CONSTRAINT_STRING_ENUM:
                     if (!listed) notes.push_back("one of: " + EnumValues(*constraint));
                     break;
-                case CallSpec::CONSTRAINT_STRING_REGEX: notes.push_back("pattern: " + constraint->GetRegex()); break;
-                default: break;
+                case CallSpec::CONSTRAINT_STRING_REGEX:
+                    notes.push_back("pattern: " + constraint->GetRegex());
+                    break;
+                default:
+                    break;
             }
         }
         if (!notes.empty()) {
             head += "  (";
-            for (std::size_t i = 0; i < notes.size(); ++i) head += (i ? ", " : "") + notes[i];
+            for (std::size_t i = 0; i < notes.size(); ++i)
+                head += (i ? ", " : "") + notes[i];
             head += ")";
         }
         out += head + "\n";
@@ -304,8 +330,8 @@ std::string CommandText(const std::string& program, const std::string& path, con
     return out;
 }
 
-std::string CommandJson(const std::string& path, const AutoCli::Command& command, const CallSpec::InputSpec& input,
-                        const CallSpec::OutputSpec* output) {
+std::string CommandJson(const std::string& path, const AutoCli::Command& command,
+                        const CallSpec::InputSpec& input, const CallSpec::OutputSpec* output) {
     std::string out = "{\"path\":";
     Format::AppendJsonString(out, path);
     out += ",\"description\":";
@@ -335,7 +361,8 @@ std::string CommandJson(const std::string& path, const AutoCli::Command& command
                 case CallSpec::CONSTRAINT_INT_ENUM: {
                     out += "{\"kind\":\"enum\",\"values\":[";
                     const auto& values = constraint->GetIntEnum();
-                    for (std::size_t i = 0; i < values.size(); ++i) out += (i ? "," : "") + std::to_string(values[i]);
+                    for (std::size_t i = 0; i < values.size(); ++i)
+                        out += (i ? "," : "") + std::to_string(values[i]);
                     out += "]}";
                     break;
                 }

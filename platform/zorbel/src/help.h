@@ -12,8 +12,8 @@ std::string NamespaceText(const std::string& program, AutoCli::NamespaceNode& no
 std::string NamespaceJson(AutoCli::NamespaceNode& node);
 std::string CommandText(const std::string& program, const std::string& path, const AutoCli::Command& command,
                         const CallSpec::InputSpec& input, const CallSpec::OutputSpec* output);
-std::string CommandJson(const std::string& path, const AutoCli::Command& command, const CallSpec::InputSpec& input,
-                        const CallSpec::OutputSpec* output);
+std::string CommandJson(const std::string& path, const AutoCli::Command& command,
+                        const CallSpec::InputSpec& input, const CallSpec::OutputSpec* output);
 // "Valid choices: a, b, c." for the children of a node.
 std::string ValidChoices(AutoCli::NamespaceNode& node);
 // The line that follows a refusal.

@@ -6,19 +6,35 @@ namespace Zorbel::MetaObj {
 
 MetaObject::~MetaObject() = default;
 
-std::shared_ptr<MetaString> MetaString::New() { return std::make_shared<MetaString>(); }
+std::shared_ptr<MetaString> MetaString::New() {
+    return std::make_shared<MetaString>();
+}
 std::shared_ptr<MetaString> MetaString::New(std::string value) {
     return std::make_shared<MetaString>(std::move(value));
 }
-std::shared_ptr<MetaObject> MetaString::Clone() const { return std::make_shared<MetaString>(value_); }
+std::shared_ptr<MetaObject> MetaString::Clone() const {
+    return std::make_shared<MetaString>(value_);
+}
 
-std::shared_ptr<MetaInt> MetaInt::New() { return std::make_shared<MetaInt>(); }
-std::shared_ptr<MetaInt> MetaInt::New(long value) { return std::make_shared<MetaInt>(value); }
-std::shared_ptr<MetaObject> MetaInt::Clone() const { return std::make_shared<MetaInt>(value_); }
+std::shared_ptr<MetaInt> MetaInt::New() {
+    return std::make_shared<MetaInt>();
+}
+std::shared_ptr<MetaInt> MetaInt::New(long value) {
+    return std::make_shared<MetaInt>(value);
+}
+std::shared_ptr<MetaObject> MetaInt::Clone() const {
+    return std::make_shared<MetaInt>(value_);
+}
 
-std::shared_ptr<MetaBool> MetaBool::New() { return std::make_shared<MetaBool>(); }
-std::shared_ptr<MetaBool> MetaBool::New(bool value) { return std::make_shared<MetaBool>(value); }
-std::shared_ptr<MetaObject> MetaBool::Clone() const { return std::make_shared<MetaBool>(value_); }
+std::shared_ptr<MetaBool> MetaBool::New() {
+    return std::make_shared<MetaBool>();
+}
+std::shared_ptr<MetaBool> MetaBool::New(bool value) {
+    return std::make_shared<MetaBool>(value);
+}
+std::shared_ptr<MetaObject> MetaBool::Clone() const {
+    return std::make_shared<MetaBool>(value_);
+}
 
 std::shared_ptr<MetaStruct> MetaStruct::New(std::string recordName) {
     return std::make_shared<MetaStruct>(std::move(recordName));
@@ -67,19 +83,26 @@ void MetaStruct::SetField(const std::string& field, const std::string& value) {
 void MetaStruct::SetField(const std::string& field, bool value) {
     SetField(field, std::shared_ptr<MetaObject>(MetaBool::New(value)));
 }
-void MetaStruct::SetField(const std::string& field, int value) { SetIntField(field, value); }
-void MetaStruct::SetField(const std::string& field, long value) { SetIntField(field, value); }
+void MetaStruct::SetField(const std::string& field, int value) {
+    SetIntField(field, value);
+}
+void MetaStruct::SetField(const std::string& field, long value) {
+    SetIntField(field, value);
+}
 void MetaStruct::SetField(const std::string& field, const std::vector<std::string>& values) {
     auto list = MetaList::New(META_STRING);
     list->Reserve(values.size());
-    for (const auto& value : values) list->Add(value);
+    for (const auto& value : values)
+        list->Add(value);
     SetField(field, std::shared_ptr<MetaObject>(std::move(list)));
 }
 void MetaStruct::SetIntField(const std::string& field, std::int64_t value) {
     SetField(field, std::shared_ptr<MetaObject>(std::make_shared<MetaInt>(value)));
 }
 
-bool MetaStruct::HasField(const std::string& field) const { return GetField(field) != nullptr; }
+bool MetaStruct::HasField(const std::string& field) const {
+    return GetField(field) != nullptr;
+}
 
 std::shared_ptr<MetaObject> MetaStruct::GetField(const std::string& field) const {
     for (const auto& entry : fields_) {
@@ -94,22 +117,28 @@ std::shared_ptr<MetaList> MetaList::New(MetaType elementType) {
 std::shared_ptr<MetaList> MetaList::New(MetaType elementType, std::shared_ptr<MetaStruct> prototype) {
     return std::make_shared<MetaList>(elementType, std::move(prototype));
 }
-std::shared_ptr<MetaList> MetaList::New(int elementType) { return New(static_cast<MetaType>(elementType)); }
+std::shared_ptr<MetaList> MetaList::New(int elementType) {
+    return New(static_cast<MetaType>(elementType));
+}
 std::shared_ptr<MetaList> MetaList::New(int elementType, std::shared_ptr<MetaStruct> prototype) {
     return New(static_cast<MetaType>(elementType), std::move(prototype));
 }
 
 std::shared_ptr<MetaObject> MetaList::Clone() const {
-    auto copy = std::make_shared<MetaList>(elementType_,
-                                           prototype_ ? std::static_pointer_cast<MetaStruct>(prototype_->Clone())
-                                                      : nullptr);
+    auto copy = std::make_shared<MetaList>(
+        elementType_, prototype_ ? std::static_pointer_cast<MetaStruct>(prototype_->Clone()) : nullptr);
     copy->items_.reserve(items_.size());
-    for (const auto& item : items_) copy->items_.push_back(item ? item->Clone() : nullptr);
+    for (const auto& item : items_)
+        copy->items_.push_back(item ? item->Clone() : nullptr);
     return copy;
 }
 
-void MetaList::Add(const char* value) { Add(MetaString::New(value ? value : "")); }
-void MetaList::Add(const std::string& value) { Add(MetaString::New(value)); }
+void MetaList::Add(const char* value) {
+    Add(MetaString::New(value ? value : ""));
+}
+void MetaList::Add(const std::string& value) {
+    Add(MetaString::New(value));
+}
 
 void MetaList::Add(std::shared_ptr<MetaString> value) {
     if (elementType_ != META_STRING) throw std::invalid_argument("a string added to a list of records");

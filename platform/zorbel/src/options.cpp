@@ -28,12 +28,14 @@ std::string Quote(const std::string& value) {
 
 std::string JoinInts(const std::vector<long>& values) {
     std::string text;
-    for (std::size_t i = 0; i < values.size(); ++i) text += (i ? ", " : "") + std::to_string(values[i]);
+    for (std::size_t i = 0; i < values.size(); ++i)
+        text += (i ? ", " : "") + std::to_string(values[i]);
     return text;
 }
 
 // Checks a string value against a string constraint; empty result when it passes.
-std::string CheckString(const std::string& option, const std::string& value, const ParameterConstraint* constraint) {
+std::string CheckString(const std::string& option, const std::string& value,
+                        const ParameterConstraint* constraint) {
     if (!constraint) return {};
     if (constraint->GetType() == CallSpec::CONSTRAINT_STRING_ENUM) {
         std::string allowed;
@@ -61,19 +63,21 @@ std::string CheckString(const std::string& option, const std::string& value, con
     return {};
 }
 
-std::string CheckInteger(const std::string& option, std::int64_t value, const ParameterConstraint* constraint) {
+std::string CheckInteger(const std::string& option, std::int64_t value,
+                         const ParameterConstraint* constraint) {
     if (!constraint) return {};
     if (constraint->GetType() == CallSpec::CONSTRAINT_INT_RANGE) {
         if (value < constraint->GetRangeLow() || value > constraint->GetRangeHigh()) {
             return "option " + option + ": " + std::to_string(value) + " is not within the range " +
-                   std::to_string(constraint->GetRangeLow()) + " to " + std::to_string(constraint->GetRangeHigh());
+                   std::to_string(constraint->GetRangeLow()) + " to " +
+                   std::to_string(constraint->GetRangeHigh());
         }
     } else if (constraint->GetType() == CallSpec::CONSTRAINT_INT_ENUM) {
         for (long allowed : constraint->GetIntEnum()) {
             if (allowed == value) return {};
         }
-        return "option " + option + ": " + std::to_string(value) + " is not one of the allowed values: " +
-               JoinInts(constraint->GetIntEnum());
+        return "option " + option + ": " + std::to_string(value) +
+               " is not one of the allowed values: " + JoinInts(constraint->GetIntEnum());
     }
     return {};
 }
@@ -87,7 +91,8 @@ std::string Store(const ParameterSpec& spec, const std::string& value, CallSpec:
             std::int64_t number = 0;
             bool overflow = false;
             if (!ParseInteger(value, number, overflow)) {
-                if (overflow) return "option " + option + ": " + Quote(value) + " does not fit in a 64-bit integer";
+                if (overflow)
+                    return "option " + option + ": " + Quote(value) + " does not fit in a 64-bit integer";
                 return "option " + option + ": " + Quote(value) + " is not an integer";
             }
             std::string problem = CheckInteger(option, number, constraint);
@@ -175,7 +180,8 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
             parameter = spec.FindParameter(name);
             if (!parameter) {
                 error = "unknown option --" + name;
-                if (name == "formatter" || name == "state" || name == "plugin-dir" || name == "format-param") {
+                if (name == "formatter" || name == "state" || name == "plugin-dir" ||
+                    name == "format-param") {
                     error += " (global options go before the first word)";
                 }
                 return false;
@@ -219,7 +225,8 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
                 if (candidate == "--help") next = false;
                 if (candidate.size() > 2 && candidate[0] == '-' && candidate[1] == '-') {
                     std::size_t eq = candidate.find('=');
-                    std::string other = candidate.substr(2, eq == std::string::npos ? std::string::npos : eq - 2);
+                    std::string other =
+                        candidate.substr(2, eq == std::string::npos ? std::string::npos : eq - 2);
                     if (spec.FindParameter(other)) next = false;
                 }
             }

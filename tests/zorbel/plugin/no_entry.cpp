@@ -1,2 +1,4 @@
 // A plug-in without the registration entry point.
-extern "C" int SomethingElse() { return 1; }
+extern "C" int SomethingElse() {
+    return 1;
+}

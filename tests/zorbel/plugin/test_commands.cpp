@@ -54,7 +54,8 @@ public:
         range->SetIntRange(1, 10);
         Param(spec, "count", 1, "c", "A count.", false, range);
         auto levels = ParameterConstraint::New(2);
-        for (long v : {1, 2, 3}) levels->AddIntEnum(v);
+        for (long v : {1, 2, 3})
+            levels->AddIntEnum(v);
         Param(spec, "level", 1, "l", "Level : %ENUM%", false, levels);
         auto colors = ParameterConstraint::New(3);
         colors->AddStringEnum("red", "The colour red");
@@ -72,7 +73,8 @@ public:
     std::shared_ptr<OutputSpec> GetOutputSpecInternal() override { return Root(GetOutputStructure()); }
     std::shared_ptr<MetaStruct> GetOutputStructure() {
         auto record = MetaStruct::New("Parsed");
-        for (const char* field : {"name", "count", "level", "color", "interface", "enabled", "all", "offset"}) {
+        for (const char* field :
+             {"name", "count", "level", "color", "interface", "enabled", "all", "offset"}) {
             record->SetField(field, MetaString::New());
         }
         record->SetField("item", MetaList::New(2));
@@ -184,12 +186,15 @@ public:
         Param(spec, "count", 1, "c", "How many records.");
         return spec;
     }
-    std::shared_ptr<OutputSpec> GetOutputSpecInternal() override { return Root(MetaList::New(3, Host("", 0))); }
+    std::shared_ptr<OutputSpec> GetOutputSpecInternal() override {
+        return Root(MetaList::New(3, Host("", 0)));
+    }
     void ExecuteInternal(std::shared_ptr<Input> input, std::shared_ptr<Output> output) override {
         auto list = MetaList::New(3, Host("", 0));
         long count = input->HasParameter("count") ? input->GetParameterInt("count") : 2;
         const char* names[] = {"alpha", "b", "gamma-long-name"};
-        for (long i = 0; i < count; ++i) list->Add(Host(names[i % 3], 1400 + 100 * i));
+        for (long i = 0; i < count; ++i)
+            list->Add(Host(names[i % 3], 1400 + 100 * i));
         output->SetRootObject(list);
     }
 };
@@ -213,7 +218,9 @@ public:
         row->SetField("Text", text);
         return row;
     }
-    std::shared_ptr<OutputSpec> GetOutputSpecInternal() override { return Root(MetaList::New(3, Row("", ""))); }
+    std::shared_ptr<OutputSpec> GetOutputSpecInternal() override {
+        return Root(MetaList::New(3, Row("", "")));
+    }
     void ExecuteInternal(std::shared_ptr<Input>, std::shared_ptr<Output> output) override {
         auto list = MetaList::New(3, Row("", ""));
         list->Add(Row("short", "one two"));
@@ -232,17 +239,23 @@ public:
     std::shared_ptr<OutputSpec> GetOutputSpecInternal() override { return Root(Value()); }
     std::shared_ptr<MetaObj::MetaObject> Value() {
         switch (kind_) {
-            case 0: return MetaInt::New(-42);
-            case 1: return MetaString::New("vSwitch0");
-            case 2: return MetaBool::New(true);
-            case 3: return MetaBool::New(false);
-            case 4: return [] {
-                auto l = MetaList::New(2);
-                l->Add("a");
-                l->Add(std::string("b\"c"));
-                return l;
-            }();
-            default: return MetaString::New("tab\there \x1b[31m\xff end");
+            case 0:
+                return MetaInt::New(-42);
+            case 1:
+                return MetaString::New("vSwitch0");
+            case 2:
+                return MetaBool::New(true);
+            case 3:
+                return MetaBool::New(false);
+            case 4:
+                return [] {
+                    auto l = MetaList::New(2);
+                    l->Add("a");
+                    l->Add(std::string("b\"c"));
+                    return l;
+                }();
+            default:
+                return MetaString::New("tab\there \x1b[31m\xff end");
         }
     }
     void ExecuteInternal(std::shared_ptr<Input>, std::shared_ptr<Output> output) override {
@@ -300,7 +313,8 @@ extern "C" void AutoCli_RegisterNamespaces(std::shared_ptr<Zorbel::AutoCli::Name
     auto scalar = Namespace::New();
     scalar->SetDescription("Scalars.");
     const char* names[] = {"int", "string", "true", "false", "strings", "raw"};
-    for (int i = 0; i < 6; ++i) scalar->RegisterNamespaceNode(std::make_shared<TestScalar>(i), names[i]);
+    for (int i = 0; i < 6; ++i)
+        scalar->RegisterNamespaceNode(std::make_shared<TestScalar>(i), names[i]);
     test->RegisterNamespaceNode(scalar, "scalar");
     auto fail = Namespace::New();
     fail->SetDescription("Failures.");

@@ -79,7 +79,9 @@ public:
     void SetDescription(const char* description);
     void SetDescription(std::string description);
     void SetRequired(bool required) { required_ = required; }
-    void SetConstraint(std::shared_ptr<ParameterConstraint> constraint) { constraint_ = std::move(constraint); }
+    void SetConstraint(std::shared_ptr<ParameterConstraint> constraint) {
+        constraint_ = std::move(constraint);
+    }
 
     const std::string& GetName() const { return name_; }
     ParameterType GetType() const { return type_; }

@@ -104,9 +104,9 @@ public:
     void SetField(const std::string& field, const std::vector<std::string>& values);
     // Other integer widths, so that unsigned and 64-bit counters need no cast.
     template <typename T>
-        requires(std::is_integral_v<T> && !std::is_same_v<T, bool> && !std::is_same_v<T, int> &&
-                 !std::is_same_v<T, long> && !std::is_same_v<T, char>)
-    void SetField(const std::string& field, T value) {
+    requires(std::is_integral_v<T> && !std::is_same_v<T, bool> && !std::is_same_v<T, int> &&
+             !std::is_same_v<T, long> &&
+             !std::is_same_v<T, char>) void SetField(const std::string& field, T value) {
         SetIntField(field, static_cast<std::int64_t>(value));
     }
 

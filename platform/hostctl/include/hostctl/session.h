@@ -1,0 +1,81 @@
+// Host sessions: one command line is one transaction on the simulated host.
+//
+// A program opens a session on the state file before it runs a command and commits it
+// afterwards. Exactly one session is current at a time; the library's implementation
+// objects reach the host model through it and throw HostCtlException when none is open.
+#pragma once
+
+#include <exception>
+#include <memory>
+#include <string>
+
+namespace HostCtl::Lib {
+
+// The state file cannot be used: it is unreadable, truncated, invalid, inconsistent, of
+// another version, or it cannot be written. what() is one line that names the file and
+// the fault. Deliberately not a HostCtlException: commands do not swallow it.
+class StateFileError : public std::exception {
+public:
+    explicit StateFileError(std::string message);
+    ~StateFileError() override;
+    const char* what() const noexcept override { return message_.c_str(); }
+
+private:
+    std::string message_;
+};
+
+// The state file to use: given when not empty, else $HADRO_STATE when set and not empty,
+// else ${XDG_STATE_HOME:-$HOME/.local/state}/hadro/host.json. Throws StateFileError when
+// no home directory can be found for the last case.
+std::string ResolveStatePath(const std::string& given);
+
+class HostSession {
+public:
+    // Opens the state file at path: takes an exclusive lock on "path.lock" (waiting for
+    // other programs), then reads the document. A missing file starts from the default host
+    // and is written by the first Commit. Throws StateFileError when the file cannot be
+    // used; the file is then left as it is.
+    static std::unique_ptr<HostSession> OpenFile(const std::string& path);
+    // A session on a document held in memory only (tests, fixtures). Throws StateFileError
+    // when the document is not acceptable.
+    static std::unique_ptr<HostSession> InMemory(const std::string& json);
+    // An in-memory session on the default host.
+    static std::unique_ptr<HostSession> InMemoryDefault();
+
+    // The current session, or nullptr.
+    static HostSession* Current();
+    // The default host document compiled into the library.
+    static std::string DefaultDocument();
+    // Checks a whole document (every section and every reference between sections) without
+    // opening a session; throws StateFileError naming origin and the fault.
+    static void ValidateDocument(const std::string& json, const std::string& origin);
+
+    HostSession(const HostSession&) = delete;
+    HostSession& operator=(const HostSession&) = delete;
+    // Releases the lock without committing.
+    ~HostSession();
+
+    // Writes the document back when something changed (file sessions; in memory this only
+    // makes the current state the committed one). Throws StateFileError on failure; the
+    // old file then stays as it was.
+    void Commit();
+    // True when Commit would write.
+    bool HasChanges() const;
+    // The current document as JSON text.
+    std::string Export() const;
+    // Replaces the whole document after checking it as ValidateDocument does; on failure
+    // throws StateFileError and the session keeps its document.
+    void Replace(const std::string& json, const std::string& origin);
+    // Replaces the whole document by the default host.
+    void Reset();
+    // The state file's path; empty for an in-memory session.
+    const std::string& GetPath() const;
+
+    struct Impl;
+
+private:
+    explicit HostSession(std::unique_ptr<Impl> impl);
+    std::unique_ptr<Impl> impl_;
+};
+
+}  // namespace HostCtl::Lib

@@ -1,0 +1,43 @@
+#include "core/hook.h"
+
+#include "core/section.h"
+#include "hostctl/exception.h"
+#include "model/faults.h"
+#include "model/journal.h"
+
+namespace TknCtl::Lib {
+
+std::optional<std::string> TryEnter(std::string_view operation, std::string_view target,
+                                    std::string_view arguments) {
+    CurrentStore();  // throws when no session is open
+
+    if (Read<Model::JournalSection>().enabled) {
+        std::string line(operation);
+        for (std::string_view part : {target, arguments}) {
+            if (part.empty()) continue;
+            line += ' ';
+            line += part;
+        }
+        Write<Model::JournalSection>().lines.push_back(std::move(line));
+    }
+
+    const auto& faults = Read<Model::FaultsSection>().faults;
+    for (std::size_t i = 0; i < faults.size(); ++i) {
+        const auto& fault = faults[i];
+        if (fault.operation != operation || (!fault.target.empty() && fault.target != target)) continue;
+        std::string message =
+            fault.message.empty() ? "Simulated failure in " + std::string(operation) : fault.message;
+        if (fault.count) {
+            auto& table = Write<Model::FaultsSection>().faults;
+            if (--*table[i].count == 0) table.erase(table.begin() + static_cast<std::ptrdiff_t>(i));
+        }
+        return message;
+    }
+    return std::nullopt;
+}
+
+void Enter(std::string_view operation, std::string_view target, std::string_view arguments) {
+    if (auto fault = TryEnter(operation, target, arguments)) throw HostCtl::Lib::HostCtlException(*fault);
+}
+
+}  // namespace TknCtl::Lib

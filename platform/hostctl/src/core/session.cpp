@@ -1,0 +1,329 @@
+#include "hostctl/session.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <pwd.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cerrno>
+#include <chrono>
+#include <cstdlib>
+#include <cstring>
+
+#include "core/embedded.h"
+#include "core/store.h"
+#include "core/text.h"
+#include "hostctl/exception.h"
+
+namespace HostCtl::Lib {
+
+using TknCtl::Lib::Printable;
+using TknCtl::Lib::Store;
+
+StateFileError::StateFileError(std::string message) : message_(Printable(message)) {}
+StateFileError::~StateFileError() = default;
+
+namespace {
+
+// A state file larger than this is refused rather than read into memory.
+constexpr off_t kMaxStateSize = 256 * 1024 * 1024;
+
+HostSession* g_current = nullptr;
+Store* g_store = nullptr;  // the current session's document
+
+std::string ErrnoText(int error) {
+    return std::strerror(error);
+}
+
+std::string Origin(const std::string& path) {
+    return "state file " + path;
+}
+
+[[noreturn]] void Fail(const std::string& path, const std::string& fault) {
+    throw StateFileError(Origin(path) + ": " + fault);
+}
+
+std::string DirectoryOf(const std::string& path) {
+    auto slash = path.rfind('/');
+    if (slash == std::string::npos) return ".";
+    if (slash == 0) return "/";
+    return path.substr(0, slash);
+}
+
+std::string BaseOf(const std::string& path) {
+    auto slash = path.rfind('/');
+    return slash == std::string::npos ? path : path.substr(slash + 1);
+}
+
+// Creates the directory and its missing parents (mode 0700).
+void MakeDirectories(const std::string& path, const std::string& stateFile) {
+    struct stat info {};
+    if (path.empty() || stat(path.c_str(), &info) == 0) return;
+    MakeDirectories(DirectoryOf(path), stateFile);
+    if (mkdir(path.c_str(), 0700) != 0 && errno != EEXIST) {
+        Fail(stateFile, "cannot create directory " + path + ": " + ErrnoText(errno));
+    }
+}
+
+bool WriteAll(int fd, const std::string& text) {
+    std::size_t done = 0;
+    while (done < text.size()) {
+        ssize_t n = write(fd, text.data() + done, text.size() - done);
+        if (n < 0) {
+            if (errno == EINTR) continue;
+            return false;
+        }
+        done += static_cast<std::size_t>(n);
+    }
+    return true;
+}
+
+}  // namespace
+
+std::string ResolveStatePath(const std::string& given) {
+    if (!given.empty()) return given;
+    if (const char* env = std::getenv("HADRO_STATE"); env && *env) return env;
+    std::string base;
+    if (const char* xdg = std::getenv("XDG_STATE_HOME"); xdg && xdg[0] == '/') {
+        base = xdg;
+    } else {
+        std::string home;
+        if (const char* env = std::getenv("HOME"); env && *env) {
+            home = env;
+        } else if (const passwd* entry = getpwuid(getuid()); entry && entry->pw_dir && *entry->pw_dir) {
+            home = entry->pw_dir;
+        } else {
+            throw StateFileError(
+                "no state file: there is no home directory; give --state or set HADRO_STATE");
+        }
+        base = home + "/.local/state";
+    }
+    return base + "/hadro/host.json";
+}
+
+struct HostSession::Impl {
+    std::unique_ptr<Store> store;
+    std::string path;  // empty in memory
+    int lockFd = -1;
+    bool mustWrite = false;  // the file does not exist yet
+    bool existed = false;
+    mode_t mode = 0600;
+
+    ~Impl() {
+        if (lockFd >= 0) close(lockFd);  // releases the lock
+    }
+
+    void WriteFile(const std::string& text);
+};
+
+HostSession::HostSession(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {
+    if (g_current) throw HostCtlException("a host session is already open");
+    g_current = this;
+    g_store = impl_->store.get();
+}
+
+HostSession::~HostSession() {
+    if (g_current == this) {
+        g_current = nullptr;
+        g_store = nullptr;
+    }
+}
+
+HostSession* HostSession::Current() {
+    return g_current;
+}
+
+std::string HostSession::DefaultDocument() {
+    return std::string(reinterpret_cast<const char*>(TknCtl::Lib::kDefaultHost),
+                       TknCtl::Lib::kDefaultHostSize);
+}
+
+void HostSession::ValidateDocument(const std::string& json, const std::string& origin) {
+    Store store(json, origin);
+    store.LoadAll();
+}
+
+std::unique_ptr<HostSession> HostSession::InMemory(const std::string& json) {
+    if (g_current) throw HostCtlException("a host session is already open");
+    auto impl = std::make_unique<Impl>();
+    impl->store = std::make_unique<Store>(json, "in-memory state");
+    return std::unique_ptr<HostSession>(new HostSession(std::move(impl)));
+}
+
+std::unique_ptr<HostSession> HostSession::InMemoryDefault() {
+    auto session = InMemory(DefaultDocument());
+    session->impl_->store->RewriteAll();
+    session->impl_->store->Rebase(session->impl_->store->Export());
+    return session;
+}
+
+std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path) {
+    if (g_current) throw HostCtlException("a host session is already open");
+    if (path.empty()) throw StateFileError("no state file given");
+    auto impl = std::make_unique<Impl>();
+    impl->path = path;
+
+    MakeDirectories(DirectoryOf(path), path);
+    std::string lockPath = path + ".lock";
+    impl->lockFd = open(lockPath.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600);
+    if (impl->lockFd < 0) Fail(path, "cannot open lock file " + lockPath + ": " + ErrnoText(errno));
+    while (flock(impl->lockFd, LOCK_EX) != 0) {
+        if (errno != EINTR) Fail(path, "cannot lock " + lockPath + ": " + ErrnoText(errno));
+    }
+
+    std::string text;
+    int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) {
+        if (errno != ENOENT) Fail(path, "cannot read: " + ErrnoText(errno));
+        impl->mustWrite = true;
+    } else {
+        struct stat info {};
+        if (fstat(fd, &info) != 0) {
+            int error = errno;
+            close(fd);
+            Fail(path, "cannot read: " + ErrnoText(error));
+        }
+        if (!S_ISREG(info.st_mode)) {
+            close(fd);
+            Fail(path, "not a regular file");
+        }
+        if (info.st_size > kMaxStateSize) {
+            close(fd);
+            Fail(path, "too large (" + std::to_string(info.st_size) + " bytes)");
+        }
+        impl->existed = true;
+        impl->mode = info.st_mode & 0777;
+        text.reserve(static_cast<std::size_t>(info.st_size));
+        char buffer[65536];
+        while (true) {
+            ssize_t n = read(fd, buffer, sizeof(buffer));
+            if (n < 0) {
+                if (errno == EINTR) continue;
+                int error = errno;
+                close(fd);
+                Fail(path, "cannot read: " + ErrnoText(error));
+            }
+            if (n == 0) break;
+            text.append(buffer, static_cast<std::size_t>(n));
+            if (static_cast<off_t>(text.size()) > kMaxStateSize) {
+                close(fd);
+                Fail(path, "too large");
+            }
+        }
+        close(fd);
+    }
+
+    if (impl->mustWrite) {
+        impl->store = std::make_unique<Store>(DefaultDocument(), Origin(path));
+        impl->store->RewriteAll();
+    } else {
+        impl->store = std::make_unique<Store>(std::move(text), Origin(path));
+    }
+    return std::unique_ptr<HostSession>(new HostSession(std::move(impl)));
+}
+
+void HostSession::Impl::WriteFile(const std::string& text) {
+    std::string dir = DirectoryOf(path);
+    std::string base = BaseOf(path);
+    std::string prefix = "." + base + ".tmp.";
+
+    // Temporary files left by writers that were killed: we hold the lock, so no other
+    // writer is at work and they can go.
+    if (DIR* listing = opendir(dir.c_str())) {
+        while (const dirent* entry = readdir(listing)) {
+            if (std::strncmp(entry->d_name, prefix.c_str(), prefix.size()) == 0) {
+                unlinkat(dirfd(listing), entry->d_name, 0);
+            }
+        }
+        closedir(listing);
+    }
+
+    static std::atomic<unsigned> counter{0};
+    std::string temp;
+    int fd = -1;
+    for (int attempt = 0; attempt < 100 && fd < 0; ++attempt) {
+        auto stamp = std::chrono::steady_clock::now().time_since_epoch().count();
+        temp = dir + "/" + prefix + std::to_string(getpid()) + "." + std::to_string(counter++) + "." +
+               std::to_string(stamp % 1000000);
+        fd = open(temp.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
+        if (fd < 0 && errno != EEXIST) break;
+    }
+    if (fd < 0)
+        Fail(path, "cannot write: cannot create a temporary file in " + dir + ": " + ErrnoText(errno));
+
+    auto abandon = [&](const std::string& step, int error) {
+        close(fd);
+        unlink(temp.c_str());
+        Fail(path, "cannot write: " + step + ": " + ErrnoText(error));
+    };
+    if (existed && mode != 0600 && fchmod(fd, mode) != 0) abandon("cannot set the mode", errno);
+    if (!WriteAll(fd, text)) abandon("write failed", errno);
+    if (fsync(fd) != 0) abandon("fsync failed", errno);
+    if (close(fd) != 0) {
+        int error = errno;
+        unlink(temp.c_str());
+        Fail(path, "cannot write: close failed: " + ErrnoText(error));
+    }
+    if (rename(temp.c_str(), path.c_str()) != 0) {
+        int error = errno;
+        unlink(temp.c_str());
+        Fail(path, "cannot write: rename failed: " + ErrnoText(error));
+    }
+    int dirFd = open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (dirFd < 0) Fail(path, "written, but cannot open its directory to sync it: " + ErrnoText(errno));
+    if (fsync(dirFd) != 0 && errno != EINVAL) {
+        int error = errno;
+        close(dirFd);
+        Fail(path, "written, but syncing its directory failed: " + ErrnoText(error));
+    }
+    close(dirFd);
+    existed = true;
+}
+
+void HostSession::Commit() {
+    std::string text = impl_->store->Export();
+    if (!impl_->mustWrite && text == impl_->store->Text()) return;
+    if (!impl_->path.empty()) impl_->WriteFile(text);
+    impl_->mustWrite = false;
+    impl_->store->Rebase(std::move(text));
+}
+
+bool HostSession::HasChanges() const {
+    return impl_->mustWrite || impl_->store->Export() != impl_->store->Text();
+}
+
+std::string HostSession::Export() const {
+    return impl_->store->Export();
+}
+
+void HostSession::Replace(const std::string& json, const std::string& origin) {
+    Store checked(json, origin);
+    checked.LoadAll();
+    checked.RewriteAll();
+    impl_->store = std::make_unique<Store>(checked.Export(),
+                                           impl_->path.empty() ? "in-memory state" : Origin(impl_->path));
+    if (g_current == this) g_store = impl_->store.get();
+    impl_->mustWrite = true;
+}
+
+void HostSession::Reset() {
+    Replace(DefaultDocument(), "the default host");
+}
+
+const std::string& HostSession::GetPath() const {
+    return impl_->path;
+}
+
+}  // namespace HostCtl::Lib
+
+namespace TknCtl::Lib {
+
+Store& CurrentStore() {
+    if (!HostCtl::Lib::g_store) throw HostCtl::Lib::HostCtlException("no host session is open");
+    return *HostCtl::Lib::g_store;
+}
+
+}  // namespace TknCtl::Lib

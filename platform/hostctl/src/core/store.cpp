@@ -1,0 +1,257 @@
+#include "core/store.h"
+
+#include <cstring>
+
+#include "core/text.h"
+#include "hostctl/exception.h"
+#include "hostctl/session.h"
+
+namespace TknCtl::Lib {
+
+using HostCtl::Lib::StateFileError;
+
+SectionFault::~SectionFault() = default;
+SectionData::~SectionData() = default;
+SectionKind::~SectionKind() = default;
+
+void Checker::Fail(const std::string& what) const {
+    throw SectionFault(what);
+}
+
+const SectionKind* FindSection(std::string_view name) {
+    for (const auto* kind : AllSections()) {
+        if (name == kind->Name()) return kind;
+    }
+    return nullptr;
+}
+
+SectionData& Access(Store& store, const SectionKind& kind, bool forWrite) {
+    return store.Get(kind, forWrite);
+}
+
+namespace {
+
+// A forward-only reader of the document's top level. It knows enough JSON to find where
+// each value ends (strings with escapes, nested brackets) without building anything.
+class Scanner {
+public:
+    explicit Scanner(const std::string& text) : text_(text) {}
+
+    std::size_t pos = 0;
+
+    bool AtEnd() const { return pos >= text_.size(); }
+    char Peek() const { return text_[pos]; }
+    void SkipBlanks() {
+        while (pos < text_.size() &&
+               (text_[pos] == ' ' || text_[pos] == '\t' || text_[pos] == '\n' || text_[pos] == '\r')) {
+            ++pos;
+        }
+    }
+    // Skips a string starting at pos ('"'); false when the text ends inside it.
+    bool SkipString() {
+        ++pos;
+        while (pos < text_.size()) {
+            char c = text_[pos++];
+            if (c == '\\') {
+                ++pos;
+            } else if (c == '"') {
+                return true;
+            }
+        }
+        return false;
+    }
+    // Skips one value; returns an empty string on success, else the fault.
+    std::string SkipValue() {
+        if (AtEnd()) return "truncated";
+        char c = Peek();
+        if (c == '"') return SkipString() ? std::string() : "truncated";
+        if (c == '{' || c == '[') {
+            std::vector<char> closers;
+            while (pos < text_.size()) {
+                c = text_[pos];
+                if (c == '"') {
+                    if (!SkipString()) return "truncated";
+                    continue;
+                }
+                ++pos;
+                if (c == '{') {
+                    closers.push_back('}');
+                } else if (c == '[') {
+                    closers.push_back(']');
+                } else if (c == '}' || c == ']') {
+                    if (closers.empty() || closers.back() != c) {
+                        return "mismatched '" + std::string(1, c) + "' at byte " + std::to_string(pos - 1);
+                    }
+                    closers.pop_back();
+                    if (closers.empty()) return {};
+                }
+            }
+            return "truncated";
+        }
+        std::size_t start = pos;
+        while (pos < text_.size() && std::strchr(",}] \t\r\n", text_[pos]) == nullptr)
+            ++pos;
+        if (pos == start) return "missing value at byte " + std::to_string(pos);
+        return {};
+    }
+
+private:
+    const std::string& text_;
+};
+
+}  // namespace
+
+Store::Store(std::string text, std::string origin) : text_(std::move(text)), origin_(std::move(origin)) {
+    for (const auto* kind : AllSections()) {
+        Slot slot;
+        slot.kind = kind;
+        slots_.push_back(std::move(slot));
+    }
+    Scan();
+}
+
+void Store::Refuse(const std::string& fault) const {
+    throw StateFileError(origin_ + ": " + fault);
+}
+
+void Store::Scan() {
+    Scanner scan(text_);
+    scan.SkipBlanks();
+    if (scan.AtEnd()) Refuse("the document is empty");
+    if (scan.Peek() != '{') Refuse("not a state document (it does not begin with '{')");
+    ++scan.pos;
+    bool versionSeen = false;
+    std::string current = "the document";
+    auto truncated = [&] { Refuse("truncated document (it ends inside " + current + ")"); };
+    scan.SkipBlanks();
+    if (!scan.AtEnd() && scan.Peek() == '}') {
+        ++scan.pos;
+    } else {
+        while (true) {
+            if (scan.AtEnd()) truncated();
+            if (scan.Peek() != '"') Refuse("expected a section name at byte " + std::to_string(scan.pos));
+            std::size_t keyStart = scan.pos + 1;
+            if (!scan.SkipString()) truncated();
+            std::string key = text_.substr(keyStart, scan.pos - 1 - keyStart);
+            current = "section " + Quote(key);
+            scan.SkipBlanks();
+            if (scan.AtEnd()) truncated();
+            if (scan.Peek() != ':') Refuse("expected ':' after " + current);
+            ++scan.pos;
+            scan.SkipBlanks();
+            std::size_t valueStart = scan.pos;
+            std::string fault = scan.SkipValue();
+            if (fault == "truncated") truncated();
+            if (!fault.empty()) Refuse(current + ": " + fault);
+            std::size_t valueEnd = scan.pos;
+
+            if (key == "version") {
+                if (versionSeen) Refuse("\"version\" appears twice");
+                versionSeen = true;
+                std::string value = text_.substr(valueStart, valueEnd - valueStart);
+                if (value != std::to_string(kDocumentVersion)) {
+                    Refuse("unsupported version " + Quote(value) + " (this program reads version " +
+                           std::to_string(kDocumentVersion) + ")");
+                }
+            } else {
+                Slot* slot = nullptr;
+                for (auto& candidate : slots_) {
+                    if (key == candidate.kind->Name()) slot = &candidate;
+                }
+                if (!slot) Refuse("unknown section " + Quote(key));
+                if (slot->present) Refuse(current + " appears twice");
+                slot->present = true;
+                slot->begin = valueStart;
+                slot->end = valueEnd;
+            }
+
+            scan.SkipBlanks();
+            if (scan.AtEnd()) truncated();
+            if (scan.Peek() == ',') {
+                ++scan.pos;
+                scan.SkipBlanks();
+                continue;
+            }
+            if (scan.Peek() == '}') {
+                ++scan.pos;
+                break;
+            }
+            Refuse("expected ',' or '}' after " + current + " at byte " + std::to_string(scan.pos));
+        }
+    }
+    scan.SkipBlanks();
+    if (!scan.AtEnd()) Refuse("unexpected text after the document at byte " + std::to_string(scan.pos));
+    if (!versionSeen) Refuse("the document has no \"version\"");
+}
+
+SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
+    Slot* slot = nullptr;
+    for (auto& candidate : slots_) {
+        if (candidate.kind == &kind) slot = &candidate;
+    }
+    if (!slot) throw HostCtl::Lib::HostCtlException(std::string("unknown section kind ") + kind.Name());
+    if (!slot->data) {
+        try {
+            slot->data =
+                slot->present
+                    ? kind.Parse(std::string_view(text_).substr(slot->begin, slot->end - slot->begin))
+                    : kind.Empty();
+        } catch (const SectionFault& fault) {
+            Refuse(fault.what());
+        }
+        // The content is in place before it is checked, so that a check of another section
+        // that looks back at this one finds it.
+        try {
+            Checker checker(*this);
+            kind.Validate(*slot->data, checker);
+        } catch (const SectionFault& fault) {
+            slot->data.reset();
+            Refuse(std::string(kind.Name()) + ": " + fault.what());
+        } catch (...) {
+            slot->data.reset();
+            throw;
+        }
+    }
+    if (forWrite) slot->dirty = true;
+    return *slot->data;
+}
+
+void Store::LoadAll() {
+    for (auto& slot : slots_)
+        Get(*slot.kind, false);
+}
+
+void Store::RewriteAll() {
+    for (auto& slot : slots_)
+        Get(*slot.kind, true);
+}
+
+std::string Store::Export() const {
+    std::string out = "{\"version\":" + std::to_string(kDocumentVersion);
+    for (const auto& slot : slots_) {
+        if (slot.data && slot.dirty) {
+            out += ",\n\"";
+            out += slot.kind->Name();
+            out += "\":";
+            out += slot.kind->Serialize(*slot.data);
+        } else if (slot.present) {
+            out += ",\n\"";
+            out += slot.kind->Name();
+            out += "\":";
+            out.append(text_, slot.begin, slot.end - slot.begin);
+        }
+    }
+    out += "\n}\n";
+    return out;
+}
+
+void Store::Rebase(std::string text) {
+    text_ = std::move(text);
+    for (auto& slot : slots_) {
+        slot.present = false;
+        slot.dirty = false;
+    }
+    Scan();
+}
+
+}  // namespace TknCtl::Lib

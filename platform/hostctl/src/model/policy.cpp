@@ -1,0 +1,75 @@
+#include "model/policy.h"
+
+#include "core/json_io.h"
+
+namespace TknCtl::Model {
+
+using Json::In;
+using Json::Node;
+
+Policy LoadPolicy(const In& in) {
+    Policy p;
+    if (auto t = in.OptMember("teaming")) {
+        p.teaming.policy = t->OptInt<std::uint32_t>("policy");
+        p.teaming.notifySwitches = t->OptBool("notifySwitches");
+        p.teaming.rollingRestoration = t->OptBool("rollingRestoration");
+        if (auto criteria = t->OptMember("linkCriteria")) {
+            p.teaming.linkCriteria = LinkCriteria{criteria->OptBool("beacon")};
+            criteria->Done();
+        }
+        if (t->Has("uplinkOrder")) p.teaming.uplinkOrder = t->Strings("uplinkOrder");
+        p.teaming.maxActive = t->OptInt<std::int32_t>("maxActive");
+        t->Done();
+    }
+    if (auto s = in.OptMember("security")) {
+        p.security.allowPromiscuous = s->OptBool("allowPromiscuous");
+        p.security.allowMacChange = s->OptBool("allowMacChange");
+        p.security.allowForgedTransmits = s->OptBool("allowForgedTransmits");
+        s->Done();
+    }
+    if (auto s = in.OptMember("shaping")) {
+        p.shaping.enabled = s->OptBool("enabled");
+        p.shaping.averageBps = s->OptInt<std::uint64_t>("averageBps");
+        p.shaping.peakBps = s->OptInt<std::uint64_t>("peakBps");
+        p.shaping.burstSize = s->OptInt<std::uint64_t>("burstSize");
+        s->Done();
+    }
+    in.Done();
+    return p;
+}
+
+namespace {
+
+template <class T>
+void Put(Node& node, const char* key, const std::optional<T>& value) {
+    if (value) node[key] = *value;
+}
+
+}  // namespace
+
+Node SavePolicy(const Policy& p) {
+    Node teaming = Node::object();
+    Put(teaming, "policy", p.teaming.policy);
+    Put(teaming, "notifySwitches", p.teaming.notifySwitches);
+    Put(teaming, "rollingRestoration", p.teaming.rollingRestoration);
+    if (p.teaming.linkCriteria) {
+        Node criteria = Node::object();
+        Put(criteria, "beacon", p.teaming.linkCriteria->beacon);
+        teaming["linkCriteria"] = std::move(criteria);
+    }
+    Put(teaming, "uplinkOrder", p.teaming.uplinkOrder);
+    Put(teaming, "maxActive", p.teaming.maxActive);
+    Node security = Node::object();
+    Put(security, "allowPromiscuous", p.security.allowPromiscuous);
+    Put(security, "allowMacChange", p.security.allowMacChange);
+    Put(security, "allowForgedTransmits", p.security.allowForgedTransmits);
+    Node shaping = Node::object();
+    Put(shaping, "enabled", p.shaping.enabled);
+    Put(shaping, "averageBps", p.shaping.averageBps);
+    Put(shaping, "peakBps", p.shaping.peakBps);
+    Put(shaping, "burstSize", p.shaping.burstSize);
+    return Node{
+        {"teaming", std::move(teaming)}, {"security", std::move(security)}, {"shaping", std::move(shaping)}};
+}
+
+}  // namespace TknCtl::Model

@@ -1,0 +1,146 @@
+#include "model/vswitches.h"
+
+#include "model/dvswitches.h"
+#include "model/pnics.h"
+#include "model/values.h"
+
+namespace TknCtl::Model {
+
+const VSwitch* VSwitchesSection::Find(const std::string& name) const {
+    for (const auto& vswitch : switches) {
+        if (vswitch.name == name) return &vswitch;
+    }
+    return nullptr;
+}
+
+VSwitch* VSwitchesSection::Find(const std::string& name) {
+    return const_cast<VSwitch*>(static_cast<const VSwitchesSection*>(this)->Find(name));
+}
+
+const VSwitch* VSwitchesSection::FindPortGroupSwitch(const std::string& portGroup) const {
+    for (const auto& vswitch : switches) {
+        for (const auto& group : vswitch.portGroups) {
+            if (group.name == portGroup) return &vswitch;
+        }
+    }
+    return nullptr;
+}
+
+const PortGroup* VSwitchesSection::FindPortGroup(const std::string& portGroup) const {
+    for (const auto& vswitch : switches) {
+        for (const auto& group : vswitch.portGroups) {
+            if (group.name == portGroup) return &group;
+        }
+    }
+    return nullptr;
+}
+
+namespace {
+
+using Json::In;
+using Json::Node;
+
+void Load(const In& in, VSwitchesSection& section) {
+    in.Elements([&](const In& item) {
+        VSwitch s;
+        s.name = item.Str("name");
+        s.className = item.Str("className", s.className);
+        s.numPorts = item.Int<std::uint32_t>("numPorts", s.numPorts);
+        s.configuredPorts = item.Int<std::uint32_t>("configuredPorts", s.configuredPorts);
+        s.usedPorts = item.Int<std::uint32_t>("usedPorts", 0);
+        s.mtu = item.Int<std::uint32_t>("mtu", s.mtu);
+        if (auto cdp = item.OptMember("cdpStatus")) s.cdpStatus = Json::NameToCode(*cdp, kCdpStatusNames);
+        if (auto beacon = item.OptMember("beacon")) {
+            s.beacon.enabled = beacon->Bool("enabled", false);
+            s.beacon.interval = beacon->Int<std::uint32_t>("interval", s.beacon.interval);
+            s.beacon.threshold = beacon->Int<std::uint32_t>("threshold", s.beacon.threshold);
+            s.beacon.requiredBy = beacon->Strings("requiredBy");
+            beacon->Done();
+        }
+        s.uplinks = item.Strings("uplinks");
+        if (auto policy = item.OptMember("policy")) s.policy = LoadPolicy(*policy);
+        item.Each("portGroups", [&](const In& pg) {
+            PortGroup group;
+            group.name = pg.Str("name");
+            group.vlanId = pg.Int<std::uint16_t>("vlanId", 0);
+            if (auto policy = pg.OptMember("policy")) group.policy = LoadPolicy(*policy);
+            group.activeClients = pg.Int<std::uint32_t>("activeClients", 0);
+            pg.Done();
+            s.portGroups.push_back(std::move(group));
+        });
+        item.Done();
+        section.switches.push_back(std::move(s));
+    });
+}
+
+Node Save(const VSwitchesSection& section) {
+    Node out = Node::array();
+    for (const auto& s : section.switches) {
+        Node groups = Node::array();
+        for (const auto& g : s.portGroups) {
+            groups.push_back({{"name", g.name},
+                              {"vlanId", g.vlanId},
+                              {"policy", SavePolicy(g.policy)},
+                              {"activeClients", g.activeClients}});
+        }
+        out.push_back({{"name", s.name},
+                       {"className", s.className},
+                       {"numPorts", s.numPorts},
+                       {"configuredPorts", s.configuredPorts},
+                       {"usedPorts", s.usedPorts},
+                       {"mtu", s.mtu},
+                       {"cdpStatus", kCdpStatusNames[s.cdpStatus < 4 ? s.cdpStatus : 3]},
+                       {"beacon",
+                        {{"enabled", s.beacon.enabled},
+                         {"interval", s.beacon.interval},
+                         {"threshold", s.beacon.threshold},
+                         {"requiredBy", s.beacon.requiredBy}}},
+                       {"uplinks", s.uplinks},
+                       {"policy", SavePolicy(s.policy)},
+                       {"portGroups", std::move(groups)}});
+    }
+    return out;
+}
+
+void Check(const VSwitchesSection& section, Lib::Checker& checker) {
+    RequireUnique(
+        section.switches, [](const VSwitch& s) { return s.name; }, checker, "switch name");
+    std::vector<std::string> groups;
+    std::vector<std::string> uplinks;
+    const auto& pnics = checker.Get<PnicsSection>();
+    const auto& dvswitches = checker.Get<DvSwitchesSection>();
+    for (const auto& s : section.switches) {
+        RequireName(s.name, checker, "switch name");
+        std::string where = "switch " + Lib::Quote(s.name) + ": ";
+        if (dvswitches.Find(s.name)) checker.Fail(where + "a distributed switch has the same name");
+        if (s.usedPorts > s.numPorts) checker.Fail(where + "more ports in use than it has");
+        for (const auto& g : s.portGroups) {
+            RequireName(g.name, checker, "port group name");
+            if (g.vlanId > kMaxVlanId) {
+                checker.Fail(where + "port group " + Lib::Quote(g.name) + " has VLAN ID " +
+                             std::to_string(g.vlanId) + " (at most 4095)");
+            }
+            groups.push_back(g.name);
+        }
+        for (const auto& uplink : s.uplinks) {
+            if (!pnics.Find(uplink))
+                checker.Fail(where + "uplink " + Lib::Quote(uplink) + " is not a physical NIC");
+            uplinks.push_back(uplink);
+        }
+    }
+    for (const auto& d : dvswitches.switches)
+        uplinks.insert(uplinks.end(), d.uplinks.begin(), d.uplinks.end());
+    RequireUnique(
+        groups, [](const std::string& g) { return g; }, checker, "port group name");
+    RequireUnique(
+        uplinks, [](const std::string& u) { return u; }, checker, "uplink (a NIC on two switches)");
+}
+
+}  // namespace
+
+const Lib::SectionKind& VSwitchesSection::Kind() {
+    static const Json::JsonSection<VSwitchesSection> kind("vswitches", Load, Save, Check);
+    return kind;
+}
+
+}  // namespace TknCtl::Model

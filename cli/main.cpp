@@ -5,9 +5,12 @@
 #include <climits>
 #include <cstdlib>
 #include <iostream>
+#include <memory>
+#include <sstream>
 #include <string>
 #include <vector>
 
+#include "hostctl/session.h"
 #include "zorbel/dispatcher.h"
 
 namespace {
@@ -53,6 +56,31 @@ std::vector<std::string> PluginDirectories(const GlobalOptions& options) {
     return {installed};
 }
 
+// Runs the command as one transaction on the host state: the session is opened only now
+// that a command is really going to run (help, listings and refusals never touch the
+// state), and committed when the command ran to its end (status 0 or 1). An exception that
+// escaped the command (status 3) discards its changes. The command's output is held back
+// until the state is safely written, so that a failed write is never reported as success.
+int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invocation,
+                 const GlobalOptions& options) {
+    using HostCtl::Lib::HostSession;
+    using HostCtl::Lib::StateFileError;
+    std::ostringstream out;
+    std::ostringstream err;
+    int status = Zorbel::AutoCli::EXIT_UNEXPECTED;
+    try {
+        auto session = HostSession::OpenFile(HostCtl::Lib::ResolveStatePath(options.statePath));
+        status = dispatcher.Execute(invocation, options, out, err);
+        if (status == Zorbel::AutoCli::EXIT_OK || status == Zorbel::AutoCli::EXIT_FAILED) session->Commit();
+    } catch (const StateFileError& e) {
+        std::cerr << "Error: " << e.what() << '\n';
+        return Zorbel::AutoCli::EXIT_UNEXPECTED;
+    }
+    std::cout << out.str();
+    std::cerr << err.str();
+    return status;
+}
+
 int Main(int argc, char** argv) {
     std::vector<std::string> args(argv + 1, argv + argc);
     GlobalOptions options;
@@ -70,7 +98,7 @@ int Main(int argc, char** argv) {
 
     auto prepared = dispatcher->Prepare(rest, options, std::cout, std::cerr);
     if (!prepared.ready) return prepared.status;
-    return dispatcher->Execute(prepared.invocation, options, std::cout, std::cerr);
+    return RunInSession(*dispatcher, prepared.invocation, options);
 }
 
 }  // namespace

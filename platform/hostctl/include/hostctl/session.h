@@ -31,11 +31,17 @@ std::string ResolveStatePath(const std::string& given);
 
 class HostSession {
 public:
+    enum class OpenMode {
+        kRead,     // use the document in the file
+        kReplace,  // the caller replaces the whole document: the file is not read (so a
+                   // damaged file can be reset), the session starts from the default host
+    };
+
     // Opens the state file at path: takes an exclusive lock on "path.lock" (waiting for
     // other programs), then reads the document. A missing file starts from the default host
     // and is written by the first Commit. Throws StateFileError when the file cannot be
     // used; the file is then left as it is.
-    static std::unique_ptr<HostSession> OpenFile(const std::string& path);
+    static std::unique_ptr<HostSession> OpenFile(const std::string& path, OpenMode mode = OpenMode::kRead);
     // A session on a document held in memory only (tests, fixtures). Throws StateFileError
     // when the document is not acceptable.
     static std::unique_ptr<HostSession> InMemory(const std::string& json);

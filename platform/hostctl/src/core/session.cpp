@@ -160,7 +160,7 @@ std::unique_ptr<HostSession> HostSession::InMemoryDefault() {
     return session;
 }
 
-std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path) {
+std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, OpenMode openMode) {
     if (g_current) throw HostCtlException("a host session is already open");
     if (path.empty()) throw StateFileError("no state file given");
     auto impl = std::make_unique<Impl>();
@@ -176,6 +176,16 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path) {
 
     std::string text;
     int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd >= 0 && openMode == OpenMode::kReplace) {
+        struct stat info {};
+        if (fstat(fd, &info) == 0 && S_ISREG(info.st_mode)) {
+            impl->existed = true;
+            impl->mode = info.st_mode & 0777;
+        }
+        close(fd);
+        fd = -1;
+        errno = ENOENT;
+    }
     if (fd < 0) {
         if (errno != ENOENT) Fail(path, "cannot read: " + ErrnoText(errno));
         impl->mustWrite = true;

@@ -1,1 +1,218 @@
-#!/bin/sh
+#!/usr/bin/env bash
+# End-to-end tests of hadrosim and of the host session around hadrocli commands, run as
+# processes on temporary state files.
+#   e2e.sh HADROSIM HADROCLI TEST_PLUGIN_DIR
+set -u
+SIM=$1
+CLI=$2
+PLUGINS=$3
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+unset HADRO_STATE
+
+passed=0
+failed=0
+# t NAME COMMAND...: one check; passes when the command succeeds.
+t() {
+    local name=$1
+    shift
+    if "$@"; then
+        passed=$((passed + 1))
+    else
+        failed=$((failed + 1))
+        echo "FAIL: $name"
+    fi
+}
+same_file() { cmp -s "$1" "$2"; }
+fingerprint() { stat -c '%i %y %s' "$1"; }
+cli() { "$CLI" --plugin-dir="$PLUGINS" "$@"; }
+# exits_with STATUS COMMAND...: the command ends with that status.
+exits_with() {
+    local want=$1
+    shift
+    "$@" >"$work/out" 2>"$work/err"
+    local got=$?
+    [ "$got" = "$want" ] || { echo "  '$*' exited $got, not $want: $(head -c 300 "$work/err")"; return 1; }
+}
+one_line_naming() { [ "$(wc -l <"$work/err")" = 1 ] && grep -qF -- "$1" "$work/err"; }
+
+# ---- reset, export, import ----
+S=$work/new/dir/host.json
+t "reset creates the state file and its directories" "$SIM" --state="$S" reset
+t "new state file is mode 0600" [ "$(stat -c %a "$S")" = 600 ]
+t "created directory is mode 0700" [ "$(stat -c %a "$work/new/dir")" = 700 ]
+"$SIM" --state="$S" export >"$work/export.json"
+t "export prints the state document" same_file "$work/export.json" "$S"
+t "export begins with the version" grep -q '^{"version":1,$' "$work/export.json"
+"$SIM" --state="$S" journal on
+t "import replaces the document" "$SIM" --state="$S" import "$work/export.json"
+t "import round trip keeps every byte" same_file "$work/export.json" "$S"
+"$SIM" --state="$S" journal on
+t "import from standard input" "$SIM" --state="$S" import - <"$work/export.json"
+t "import from standard input round trip" same_file "$work/export.json" "$S"
+t "HADRO_STATE selects the state file" env HADRO_STATE="$S" "$SIM" fault list
+env XDG_STATE_HOME="$work/xdg" "$SIM" reset
+t "XDG_STATE_HOME/hadro/host.json is the default" [ -f "$work/xdg/hadro/host.json" ]
+env -u XDG_STATE_HOME HOME="$work/home" "$SIM" reset
+t "HOME/.local/state/hadro/host.json without XDG_STATE_HOME" [ -f "$work/home/.local/state/hadro/host.json" ]
+
+# ---- faults ----
+"$SIM" --state="$S" fault add A::B
+"$SIM" --state="$S" fault add A::C --target vmnic1 --message "boom now" --count 2
+printf 'A::B\t*\tunlimited\tSimulated failure in A::B\nA::C\tvmnic1\t2\tboom now\n' >"$work/want"
+"$SIM" --state="$S" fault list >"$work/got"
+t "fault list shows operation, target, count and message" same_file "$work/want" "$work/got"
+"$SIM" --state="$S" fault clear
+t "fault clear empties the table" [ -z "$("$SIM" --state="$S" fault list)" ]
+
+"$SIM" --state="$S" fault add SimTest::Touch --target vmnic0 --message "injected" --count 2
+t "a fault fails a matching call" exits_with 1 cli --state="$S" simtest touch --mode ok
+t "the fault's message is the command's error" grep -qx injected "$work/err"
+t "a counted fault fails again" exits_with 1 cli --state="$S" simtest touch --mode ok
+t "a used-up fault is gone" exits_with 0 cli --state="$S" simtest touch --mode ok
+t "a used-up fault is no longer listed" [ -z "$("$SIM" --state="$S" fault list)" ]
+"$SIM" --state="$S" fault add SimTest::Touch --target vmnic9
+t "a fault on another target does not fire" exits_with 0 cli --state="$S" simtest touch --mode ok
+"$SIM" --state="$S" fault add SimTest::Touch
+t "a fault without target fires on any target" exits_with 1 cli --state="$S" simtest touch --mode ok
+t "the default fault message names the operation" grep -qx "Simulated failure in SimTest::Touch" "$work/err"
+"$SIM" --state="$S" fault clear
+
+# ---- journal ----
+"$SIM" --state="$S" journal clear
+"$SIM" --state="$S" journal on
+cli --state="$S" simtest touch --mode ok >/dev/null
+cli --state="$S" simtest touch --mode read >/dev/null
+printf 'SimTest::Touch vmnic0 ok\nSimTest::Touch vmnic0 read\n' >"$work/want"
+"$SIM" --state="$S" journal show >"$work/got"
+t "journal records calls in order" same_file "$work/want" "$work/got"
+"$SIM" --state="$S" journal clear
+t "journal clear forgets the calls" [ -z "$("$SIM" --state="$S" journal show)" ]
+"$SIM" --state="$S" journal off
+cli --state="$S" simtest touch --mode read >/dev/null
+t "journal off records nothing" [ -z "$("$SIM" --state="$S" journal show)" ]
+
+# ---- refused command lines leave the state alone ----
+N=$work/untouched/host.json
+for args in "" "bogus" "fault" "fault add" "fault add X --count 0" "fault add X --count abc" \
+    "fault add X Y" "fault add X --colour red" "journal maybe" "journal show extra" "import" "reset now" \
+    "--frob reset"; do
+    # shellcheck disable=SC2086
+    t "hadrosim $args is refused with status 2" exits_with 2 "$SIM" --state="$N" $args
+done
+t "hadrosim --help prints the usage" exits_with 0 "$SIM" --help
+t "hadrosim --help names the commands" grep -q "fault add OPERATION" "$work/out"
+for args in "--help" "--list-commands" "simtest" "simtest touch" "nosuch command"; do
+    # shellcheck disable=SC2086
+    cli --state="$N" $args >/dev/null 2>&1
+done
+t "help, listings and refusals never create the state" [ ! -e "$N" ] && [ ! -e "$N.lock" ]
+
+# ---- hadrocli: one command, one transaction ----
+C=$work/cli/host.json
+t "a first command creates the state from the default host" exits_with 0 cli --state="$C" simtest touch --mode read
+t "... which is written on that first use" grep -q '"ipsettings":{"ipv6Enabled":true}' "$C"
+t "a command that succeeds is committed" exits_with 0 cli --state="$C" simtest touch --mode ok
+t "... with its change" grep -q '"ipsettings":{"ipv6Enabled":false}' "$C"
+t "a command that reports an error is committed" exits_with 1 cli --state="$C" simtest touch --mode error
+t "... with its change" grep -q '"ipsettings":{"ipv6Enabled":true}' "$C"
+cp "$C" "$work/before"
+t "an exception escaping the command gives status 3" exits_with 3 cli --state="$C" simtest touch --mode throw
+t "... and discards the changes" same_file "$work/before" "$C"
+
+# ---- an unchanged state is not rewritten ----
+before=$(fingerprint "$C")
+cli --state="$C" simtest touch --mode read >/dev/null
+"$SIM" --state="$C" fault list >/dev/null
+"$SIM" --state="$C" journal show >/dev/null
+"$SIM" --state="$C" journal off
+"$SIM" --state="$C" fault clear
+"$SIM" --state="$C" export >/dev/null
+t "reading commands leave inode and mtime alone" [ "$before" = "$(fingerprint "$C")" ]
+
+# ---- damaged state files are refused and left as they are ----
+canonical=$work/canonical.json
+"$SIM" --state="$canonical" reset
+D=$work/damaged/host.json
+mkdir -p "$work/damaged"
+damage() {
+    case $1 in
+    empty) : >"$D" ;;
+    blank) printf '  \n' >"$D" ;;
+    truncated) head -c 20000 "$canonical" >"$D" ;;
+    truncated-end) head -c -3 "$canonical" >"$D" ;;
+    garbage) printf 'hello, world\n' >"$D" ;;
+    binary) head -c 512 /dev/urandom >"$D" ;;
+    version) sed 's/^{"version":1,$/{"version":2,/' "$canonical" >"$D" ;;
+    no-version) sed 's/^{"version":1,$/{/' "$canonical" >"$D" ;;
+    unknown-section) sed 's/^"journal":/"jounral":/' "$canonical" >"$D" ;;
+    bad-json) sed 's/^"pnics":\[/"pnics":[1,,/' "$canonical" >"$D" ;;
+    wrong-type) sed 's/"name":"vmnic0"/"name":7/' "$canonical" >"$D" ;;
+    inconsistent) sed 's/"name":"vmnic1"/"name":"vmnic0"/' "$canonical" >"$D" ;;
+    dangling) sed 's/"ownerWorldId":2110598/"ownerWorldId":42/' "$canonical" >"$D" ;;
+    esac
+}
+for kind in empty blank truncated truncated-end garbage binary version no-version unknown-section bad-json \
+    wrong-type inconsistent dangling; do
+    damage $kind
+    cp "$D" "$work/damaged.copy"
+    t "hadrosim refuses a $kind state file with status 3" exits_with 3 "$SIM" --state="$D" fault add X
+    t "... in one line naming the file ($kind)" one_line_naming "$D"
+    t "hadrocli refuses a $kind state file with status 3" exits_with 3 cli --state="$D" simtest touch --mode read
+    t "... in one line naming the file ($kind)" one_line_naming "$D"
+    t "... and leaves it byte for byte ($kind)" same_file "$D" "$work/damaged.copy"
+    t "hadrosim refuses to import a $kind document" exits_with 3 "$SIM" --state="$C" import "$work/damaged.copy"
+done
+t "a refused import leaves the state alone" same_file "$work/before" "$C"
+mkdir -p "$work/dir-state"
+t "a directory is no state file" exits_with 3 cli --state="$work/dir-state" simtest touch --mode read
+: >"$work/not-a-dir"
+t "a state file below a regular file is refused" exits_with 3 cli --state="$work/not-a-dir/host.json" simtest touch --mode read
+damage garbage
+t "reset repairs a damaged state file" "$SIM" --state="$D" reset
+t "... to the default host" same_file "$D" "$canonical"
+
+# ---- several writers at once lose nothing (the lock) ----
+L=$work/lock/host.json
+"$SIM" --state="$L" reset
+for writer in 1 2 3 4 5 6 7 8; do
+    (for n in $(seq 1 50); do "$SIM" --state="$L" fault add "W$writer::Op$n" || exit 1; done) &
+done
+wait
+t "8 writers x 50 faults: all 400 are there" [ "$("$SIM" --state="$L" fault list | wc -l)" = 400 ]
+t "... each exactly once" [ "$("$SIM" --state="$L" fault list | cut -f1 | sort -u | wc -l)" = 400 ]
+
+# ---- a writer killed at any point leaves an old or a new document, never a torn one ----
+K=$work/kill/host.json
+"$SIM" --state="$K" reset
+small=$work/small.json
+cp "$K" "$small"
+big=$work/big.json
+entry='{"protocol":"tcp","recvQ":0,"sendQ":0,"localAddress":"192.0.2.10","localPort":22,"foreignAddress":"198.51.100.9","foreignPort":40000,"state":4,"worldId":2097905,"ccAlgo":"newreno"},'
+prefix='"connections":[{"netstack":"defaultTcpipStack","connections":['
+while IFS= read -r line; do
+    if [[ $line == "$prefix"* ]]; then
+        printf '%s' "$prefix"
+        yes "$entry" | head -n 15000 | tr -d '\n'
+        printf '%s\n' "${line#"$prefix"}"
+    else
+        printf '%s\n' "$line"
+    fi
+done <"$small" >"$big"
+"$SIM" --state="$work/big-canonical.json" import "$big"
+torn=0
+for round in $(seq 1 24); do
+    if [ $((round % 2)) = 0 ]; then source=$big; else source=$small; fi
+    "$SIM" --state="$K" import "$source" 2>/dev/null &
+    victim=$!
+    sleep "0.$(printf '%03d' $((RANDOM % 250)))"
+    kill -9 "$victim" 2>/dev/null
+    wait "$victim" 2>/dev/null
+    if ! same_file "$K" "$small" && ! same_file "$K" "$work/big-canonical.json"; then torn=$((torn + 1)); fi
+done
+t "no killed writer left a torn or empty state file" [ "$torn" = 0 ]
+t "the state file is sound after the killings" "$SIM" --state="$K" fault add After::Kill
+t "temporary files of killed writers are cleaned up" [ -z "$(find "$work/kill" -name '.host.json.tmp.*')" ]
+
+echo "$passed passed, $failed failed"
+[ "$failed" = 0 ]

@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "core/section.h"
+#include "core/store.h"
 #include "core/text.h"
 #include "hostctl/session.h"
 #include "model/faults.h"
@@ -219,6 +220,9 @@ int Run(const std::vector<std::string>& args) {
     bool replaces = action == Action::kReset || action == Action::kImport;
     auto session = HostSession::OpenFile(
         path, replaces ? HostSession::OpenMode::kReplace : HostSession::OpenMode::kRead);
+    // hadrosim checks the whole document, not only the sections it touches: it is the tool
+    // that says whether a state file is sound.
+    if (!replaces) TknCtl::Lib::CurrentStore().LoadAll();
     std::string output;
     using TknCtl::Lib::Read;
     using TknCtl::Lib::Write;

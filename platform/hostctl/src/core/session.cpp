@@ -294,15 +294,15 @@ void HostSession::Impl::WriteFile(const std::string& text) {
 }
 
 void HostSession::Commit() {
+    if (!impl_->mustWrite && !impl_->store->HasChanges()) return;
     std::string text = impl_->store->Export();
-    if (!impl_->mustWrite && text == impl_->store->Text()) return;
     if (!impl_->path.empty()) impl_->WriteFile(text);
     impl_->mustWrite = false;
     impl_->store->Rebase(std::move(text));
 }
 
 bool HostSession::HasChanges() const {
-    return impl_->mustWrite || impl_->store->Export() != impl_->store->Text();
+    return impl_->mustWrite || impl_->store->HasChanges();
 }
 
 std::string HostSession::Export() const {

@@ -226,6 +226,19 @@ void Store::RewriteAll() {
         Get(*slot.kind, true);
 }
 
+bool Store::HasChanges() const {
+    for (const auto& slot : slots_) {
+        if (!slot.data || !slot.dirty) continue;
+        std::string now = slot.kind->Serialize(*slot.data);
+        if (slot.present) {
+            if (std::string_view(text_).substr(slot.begin, slot.end - slot.begin) != now) return true;
+        } else if (now != slot.kind->Serialize(*slot.kind->Empty())) {
+            return true;
+        }
+    }
+    return false;
+}
+
 std::string Store::Export() const {
     std::string out = "{\"version\":" + std::to_string(kDocumentVersion);
     for (const auto& slot : slots_) {

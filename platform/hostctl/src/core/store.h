@@ -31,6 +31,9 @@ public:
     // Marks every section changed so that the next export writes all of them in the
     // canonical form.
     void RewriteAll();
+    // True when a section was changed: its content now serialises differently from what the
+    // document holds (a section written back unchanged, or only re-formatted, is no change).
+    bool HasChanges() const;
     // The document with the current content of every section.
     std::string Export() const;
     // Makes text (an export of this store) the new base text; nothing is changed after it.

@@ -15,14 +15,20 @@
 
 namespace HostCtl::Network {
 
-// Defined with the operations that use them (dvs.h, nic.h).
+// Defined in dvs.h.
 struct PacketStats;
 struct TrafficStats;
 class FilterStats;
-struct VlanStats;
 struct LacpConfig;
 struct LacpStatus;
 struct DVPortLacpState;
+
+// The packet counters of one VLAN on an uplink.
+struct VlanStats {
+    std::uint32_t vlanId = 0;
+    std::uint64_t packetsReceived = 0;
+    std::uint64_t packetsSent = 0;
+};
 
 // A port of a switch.
 class Port {

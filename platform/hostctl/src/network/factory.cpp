@@ -1,0 +1,65 @@
+// The host, its factories and the network information object.
+#include "core/hook.h"
+#include "core/section.h"
+#include "hostctl/exception.h"
+#include "hostctl/network/dvs.h"
+#include "hostctl/network/network_info.h"
+#include "model/dvswitches.h"
+#include "model/netstacks.h"
+
+namespace HostCtl::Network {
+
+NetworkInfo::~NetworkInfo() = default;
+
+std::unique_ptr<NetworkInfo> NetworkFactory::GetNetworkInfo() {
+    TknCtl::Lib::Enter("HostCtl::Network::NetworkFactory::GetNetworkInfo");
+    return std::make_unique<TknCtl::Network::NetworkInfoImpl>();
+}
+
+std::unique_ptr<DVSwitch> NetworkFactory::GetDVSwitchByName(std::string name) {
+    TknCtl::Lib::Enter("HostCtl::Network::NetworkFactory::GetDVSwitchByName", name);
+    if (!TknCtl::Lib::Read<TknCtl::Model::DvSwitchesSection>().Find(name)) return nullptr;
+    return std::make_unique<TknCtl::Network::DVSwitchImpl>(name);
+}
+
+std::unique_ptr<DVPort> NetworkFactory::GetDVPort(const DVPortParam& param) {
+    TknCtl::Lib::Enter("HostCtl::Network::NetworkFactory::GetDVPort", param.GetPortId(), param.GetSwitchUuid());
+    const auto* dvs = TknCtl::Lib::Read<TknCtl::Model::DvSwitchesSection>().FindByUuid(param.GetSwitchUuid());
+    if (!dvs) throw Lib::HostCtlException("No distributed switch with UUID '" + param.GetSwitchUuid() + "'");
+    if (!dvs->FindPort(param.GetPortId())) {
+        throw Lib::HostCtlException("Distributed switch " + dvs->name + " has no port '" + param.GetPortId() + "'");
+    }
+    return std::make_unique<TknCtl::Network::DVPortImpl>(param);
+}
+
+}  // namespace HostCtl::Network
+
+namespace HostCtl {
+
+Host::~Host() = default;
+
+std::unique_ptr<Network::NetworkInfo> Host::GetNetworkInfo() {
+    TknCtl::Lib::Enter("HostCtl::Host::GetNetworkInfo");
+    return std::make_unique<TknCtl::Network::NetworkInfoImpl>();
+}
+
+std::unique_ptr<Host> HostFactory::GetHost() {
+    TknCtl::Lib::Enter("HostCtl::HostFactory::GetHost");
+    return std::make_unique<Host>();
+}
+
+}  // namespace HostCtl
+
+namespace TknCtl::Network {
+
+NetworkInfoImpl::NetworkInfoImpl() = default;
+NetworkInfoImpl::~NetworkInfoImpl() = default;
+
+std::uint32_t NetworkInfoImpl::GetNetstackInstanceState(const std::string& key) {
+    Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetNetstackInstanceState", key);
+    const auto* netstack = Lib::Read<Model::NetstacksSection>().Find(key);
+    if (!netstack) throw HostCtl::Lib::HostCtlException("Netstack instance '" + key + "' does not exist");
+    return netstack->state;
+}
+
+}  // namespace TknCtl::Network

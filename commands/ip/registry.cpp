@@ -3,8 +3,15 @@
 
 namespace TalvexCli::NetworkNamespace {
 
+// The IP commands come in two groups: the host's IP services (routes, DNS, neighbours,
+// connections, global settings, multicast) and its netstack instances and IPsec.
 const FactoryList& IpFactories() {
-    static const FactoryList factories{};
+    static const FactoryList factories = [] {
+        FactoryList all = IpServiceFactories();
+        const FactoryList& stacks = IpStackFactories();
+        all.insert(all.end(), stacks.begin(), stacks.end());
+        return all;
+    }();
     return factories;
 }
 

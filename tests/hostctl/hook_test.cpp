@@ -7,6 +7,7 @@
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
+#include "hostctl/lib/object.h"
 #include "hostctl/session.h"
 #include "hostctl/util.h"
 #include "model/faults.h"
@@ -100,4 +101,23 @@ TEST(Hook, JournalRecordsEveryCallInOrderWhenOn) {
               (std::vector<std::string>{"A::First vmnic0 speed 1000 true", "A::Second",
                                         "A::Third only arguments", "B::Fails vSwitch0",
                                         "TknCtl::Util::TknCtl_Exec /etc/init.d/nfcd restart"}));
+}
+
+namespace {
+class Probe : public TknCtl::Lib::TknCtlObject, public TknCtl::Lib::Refreshable {
+public:
+    void Refresh() override { ++refreshed; }
+    int refreshed = 0;
+};
+}  // namespace
+
+TEST(ImplementationObjects, NeedAnOpenSessionAndStartStale) {
+    EXPECT_THROW(Probe(), HostCtlException);
+    auto session = HostSession::InMemoryDefault();
+    Probe probe;
+    EXPECT_TRUE(probe.IsStale());
+    if (probe.IsStale()) probe.Refresh();
+    probe.SetStale(false);
+    EXPECT_EQ(probe.refreshed, 1);
+    EXPECT_FALSE(probe.IsStale());
 }

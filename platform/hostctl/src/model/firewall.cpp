@@ -22,6 +22,24 @@ bool IsAllowedIpText(const std::string& text) {
            Ipv4Network::IsValidAddressAndNetmask(text) || Ipv6Network::IsValidAddressAndNetmask(text);
 }
 
+std::optional<AllowedIp> ParseAllowedIp(const std::string& text) {
+    if (Ipv4Address::IsValidAddress(text))
+        return AllowedIp{AllowedIpKind::kIpv4Address, Ipv4Address(text).GetStringAddress()};
+    if (Ipv6Address::IsValidAddress(text))
+        return AllowedIp{AllowedIpKind::kIpv6Address, Ipv6Address(text).GetStringAddress()};
+    if (Ipv4Network::IsValidAddressAndNetmask(text)) {
+        Ipv4Network network(text);
+        return AllowedIp{AllowedIpKind::kIpv4Network,
+                         Ipv4Network(network.GetNetwork(), network.GetPrefixLength()).GetStringAddress()};
+    }
+    if (Ipv6Network::IsValidAddressAndNetmask(text)) {
+        Ipv6Network network(text);
+        return AllowedIp{AllowedIpKind::kIpv6Network,
+                         Ipv6Network(network.GetNetwork(), network.GetNetmask()).GetStringAddress()};
+    }
+    return std::nullopt;
+}
+
 namespace {
 
 using Json::In;
@@ -60,6 +78,7 @@ Node SaveRules(const std::vector<FirewallRule>& rules) {
 
 void Load(const In& in, FirewallSection& section) {
     section.moduleLoaded = in.Bool("moduleLoaded", true);
+    section.filtersInstalled = in.Bool("filtersInstalled", section.moduleLoaded);
     section.enabled = in.Bool("enabled", true);
     if (auto action = in.OptMember("defaultAction")) {
         const char* const actions[] = {"DROP", "PASS"};
@@ -95,6 +114,7 @@ Node Save(const FirewallSection& section) {
                             {"clientCount", r.clientCount}});
     }
     return Node{{"moduleLoaded", section.moduleLoaded},
+                {"filtersInstalled", section.filtersInstalled},
                 {"enabled", section.enabled},
                 {"defaultAction", section.defaultActionPass ? "PASS" : "DROP"},
                 {"rulesets", std::move(rulesets)},
@@ -107,6 +127,22 @@ void Check(const FirewallSection& section, Lib::Checker& checker) {
     for (const auto& r : section.rulesets) {
         RequireName(r.id, checker, "ruleset ID");
         if (r.clientCount < 0) checker.Fail("ruleset " + Lib::Quote(r.id) + " has a negative client count");
+        RequireUnique(
+            r.allowedIps, [](const std::string& text) { return ParseAllowedIp(text)->text; }, checker,
+            ("allowed address of ruleset " + Lib::Quote(r.id) + ":").c_str());
+    }
+    if (section.filtersInstalled && !section.moduleLoaded)
+        checker.Fail("firewall filters are installed while the module is not loaded");
+    if (!section.dynamicRules.empty() && !section.filtersInstalled)
+        checker.Fail("dynamic firewall rules while the firewall filters are not installed");
+    for (std::size_t i = 0; i < section.dynamicRules.size(); ++i) {
+        for (std::size_t j = 0; j < i; ++j) {
+            const auto& a = section.dynamicRules[i];
+            const auto& b = section.dynamicRules[j];
+            if (a.portType == b.portType && a.portBegin == b.portBegin && a.portEnd == b.portEnd &&
+                a.direction == b.direction && a.protocol == b.protocol)
+                checker.Fail("duplicate dynamic firewall rule");
+        }
     }
 }
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -31,6 +32,9 @@ struct Ruleset {
 struct FirewallSection {
     static const Lib::SectionKind& Kind();
     bool moduleLoaded = true;  // the "hadrofw" module
+    // The ruleset configuration is loaded into the data path. Only while the module is
+    // loaded; dynamic rules only while the filters are installed.
+    bool filtersInstalled = true;
     bool enabled = true;
     bool defaultActionPass = false;  // false: DROP
     std::vector<Ruleset> rulesets;
@@ -40,7 +44,21 @@ struct FirewallSection {
     Ruleset* Find(const std::string& id);
 };
 
+// The name of the firewall's kernel module.
+inline constexpr const char* kFirewallModule = "hadrofw";
+
 // True when text is an IPv4 or IPv6 address or network ("address/prefix").
 bool IsAllowedIpText(const std::string& text);
+
+// An entry of an allowed list: its kind and its canonical text (addresses as the host prints
+// them, networks with their host bits cleared). Two entries are the same when their
+// canonical texts are.
+enum class AllowedIpKind { kIpv4Address, kIpv4Network, kIpv6Address, kIpv6Network };
+struct AllowedIp {
+    AllowedIpKind kind;
+    std::string text;
+};
+// Nothing when text is not an address or network.
+std::optional<AllowedIp> ParseAllowedIp(const std::string& text);
 
 }  // namespace TknCtl::Model

@@ -1,26 +1,35 @@
-// Bases of the library's implementation objects.
+// Bases of the library's implementation objects (TknCtl::...Impl).
 #pragma once
 
 namespace TknCtl::Lib {
 
-// The base of the objects a command creates from the library. Refresh() brings the object's
-// cached view of the host up to date.
+// An implementation object is created for one invocation and reaches the host model
+// through the current host session. Constructing one with no session open throws
+// HostCtl::Lib::HostCtlException("no host session is open").
 class TknCtlObject {
 public:
-    TknCtlObject() = default;
-    TknCtlObject(const TknCtlObject&) = default;
-    TknCtlObject& operator=(const TknCtlObject&) = default;
     virtual ~TknCtlObject();
 
-    virtual void Refresh();
+protected:
+    TknCtlObject();
+    TknCtlObject(const TknCtlObject&) = default;
+    TknCtlObject& operator=(const TknCtlObject&) = default;
 };
 
-// Objects whose state is read once and then kept: the stale flag says the state must be
-// read again (Refresh) before it is used. A new object starts stale.
+// The refreshable part of an object whose state is read from the host on demand: while
+// the object is stale, callers Refresh() it before reading its state and then clear the
+// flag. A new object is stale.
 class Refreshable {
 public:
+    virtual ~Refreshable();
+    virtual void Refresh() = 0;
     bool IsStale() const { return stale_; }
     void SetStale(bool stale) { stale_ = stale; }
+
+protected:
+    Refreshable() = default;
+    Refreshable(const Refreshable&) = default;
+    Refreshable& operator=(const Refreshable&) = default;
 
 private:
     bool stale_ = true;

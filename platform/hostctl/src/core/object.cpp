@@ -1,0 +1,15 @@
+#include "hostctl/lib/object.h"
+
+#include "core/section.h"
+
+namespace TknCtl::Lib {
+
+TknCtlObject::TknCtlObject() {
+    CurrentStore();
+}
+
+TknCtlObject::~TknCtlObject() = default;
+
+Refreshable::~Refreshable() = default;
+
+}  // namespace TknCtl::Lib

@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <pwd.h>
 #include <sys/file.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -12,6 +13,8 @@
 #include <chrono>
 #include <cstdlib>
 #include <cstring>
+#include <string_view>
+#include <vector>
 
 #include "core/embedded.h"
 #include "core/store.h"
@@ -68,7 +71,7 @@ void MakeDirectories(const std::string& path, const std::string& stateFile) {
     }
 }
 
-bool WriteAll(int fd, const std::string& text) {
+bool WriteAll(int fd, std::string_view text) {
     std::size_t done = 0;
     while (done < text.size()) {
         ssize_t n = write(fd, text.data() + done, text.size() - done);
@@ -79,6 +82,52 @@ bool WriteAll(int fd, const std::string& text) {
         done += static_cast<std::size_t>(n);
     }
     return true;
+}
+
+// Reads the whole file into out; returns the fault, or "" on success. Documents of a
+// megabyte or more go into memory backed by huge pages where the system offers them:
+// otherwise faulting in the pages costs more than everything else a command does. The file
+// may still change size under a writer that ignores the lock, so it is read to its end
+// whatever fstat said.
+std::string ReadFile(int fd, std::size_t expected, TknCtl::Lib::FileText& out) {
+    constexpr std::size_t kHugePage = 2 * 1024 * 1024;
+    if (expected > static_cast<std::size_t>(kMaxStateSize)) {
+        return "too large (" + std::to_string(expected) + " bytes)";
+    }
+    std::size_t capacity = expected + 65536;
+    char* block = nullptr;
+    if (expected >= kHugePage / 2) {
+        capacity = (capacity + kHugePage - 1) / kHugePage * kHugePage;
+        block = static_cast<char*>(std::aligned_alloc(kHugePage, capacity));
+        if (block) madvise(block, capacity, MADV_HUGEPAGE);
+    } else {
+        block = static_cast<char*>(std::malloc(capacity));
+    }
+    if (!block) return "too large to read into memory";
+    out.block.reset(block);
+    std::size_t used = 0;
+    while (true) {
+        if (used == capacity) {
+            if (capacity > static_cast<std::size_t>(kMaxStateSize)) return "too large";
+            std::size_t larger = capacity * 2;
+            char* grown = static_cast<char*>(std::realloc(out.block.get(), larger));
+            if (!grown) return "too large to read into memory";
+            out.block.release();
+            out.block.reset(grown);
+            capacity = larger;
+        }
+        ssize_t n = read(fd, out.block.get() + used, capacity - used);
+        if (n < 0) {
+            if (errno == EINTR) continue;
+            return "cannot read: " + ErrnoText(errno);
+        }
+        if (n == 0) break;
+        used += static_cast<std::size_t>(n);
+    }
+    if (used > static_cast<std::size_t>(kMaxStateSize))
+        return "too large (" + std::to_string(used) + " bytes)";
+    out.size = used;
+    return {};
 }
 
 }  // namespace
@@ -116,7 +165,7 @@ struct HostSession::Impl {
         if (lockFd >= 0) close(lockFd);  // releases the lock
     }
 
-    void WriteFile(const std::string& text);
+    void WriteFile(const std::vector<std::string_view>& pieces);
 };
 
 HostSession::HostSession(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {
@@ -174,7 +223,7 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, Open
         if (errno != EINTR) Fail(path, "cannot lock " + lockPath + ": " + ErrnoText(errno));
     }
 
-    std::string text;
+    TknCtl::Lib::FileText text;
     int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
     if (fd >= 0 && openMode == OpenMode::kReplace) {
         struct stat info {};
@@ -200,30 +249,11 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, Open
             close(fd);
             Fail(path, "not a regular file");
         }
-        if (info.st_size > kMaxStateSize) {
-            close(fd);
-            Fail(path, "too large (" + std::to_string(info.st_size) + " bytes)");
-        }
         impl->existed = true;
         impl->mode = info.st_mode & 0777;
-        text.reserve(static_cast<std::size_t>(info.st_size));
-        char buffer[65536];
-        while (true) {
-            ssize_t n = read(fd, buffer, sizeof(buffer));
-            if (n < 0) {
-                if (errno == EINTR) continue;
-                int error = errno;
-                close(fd);
-                Fail(path, "cannot read: " + ErrnoText(error));
-            }
-            if (n == 0) break;
-            text.append(buffer, static_cast<std::size_t>(n));
-            if (static_cast<off_t>(text.size()) > kMaxStateSize) {
-                close(fd);
-                Fail(path, "too large");
-            }
-        }
+        std::string fault = ReadFile(fd, static_cast<std::size_t>(info.st_size), text);
         close(fd);
+        if (!fault.empty()) Fail(path, fault);
     }
 
     if (impl->mustWrite) {
@@ -235,7 +265,7 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, Open
     return std::unique_ptr<HostSession>(new HostSession(std::move(impl)));
 }
 
-void HostSession::Impl::WriteFile(const std::string& text) {
+void HostSession::Impl::WriteFile(const std::vector<std::string_view>& pieces) {
     std::string dir = DirectoryOf(path);
     std::string base = BaseOf(path);
     std::string prefix = "." + base + ".tmp.";
@@ -270,7 +300,9 @@ void HostSession::Impl::WriteFile(const std::string& text) {
         Fail(path, "cannot write: " + step + ": " + ErrnoText(error));
     };
     if (existed && mode != 0600 && fchmod(fd, mode) != 0) abandon("cannot set the mode", errno);
-    if (!WriteAll(fd, text)) abandon("write failed", errno);
+    for (auto piece : pieces) {
+        if (!WriteAll(fd, piece)) abandon("write failed", errno);
+    }
     if (fsync(fd) != 0) abandon("fsync failed", errno);
     if (close(fd) != 0) {
         int error = errno;
@@ -295,10 +327,10 @@ void HostSession::Impl::WriteFile(const std::string& text) {
 
 void HostSession::Commit() {
     if (!impl_->mustWrite && !impl_->store->HasChanges()) return;
-    std::string text = impl_->store->Export();
-    if (!impl_->path.empty()) impl_->WriteFile(text);
+    Store::Snapshot snapshot = impl_->store->TakeSnapshot();
+    if (!impl_->path.empty()) impl_->WriteFile(snapshot.pieces);
     impl_->mustWrite = false;
-    impl_->store->Rebase(std::move(text));
+    impl_->store->Committed(std::move(snapshot));
 }
 
 bool HostSession::HasChanges() const {

@@ -1,5 +1,6 @@
 #include "core/store.h"
 
+#include <array>
 #include <cstring>
 
 #include "core/text.h"
@@ -31,11 +32,19 @@ SectionData& Access(Store& store, const SectionKind& kind, bool forWrite) {
 
 namespace {
 
+// The characters that matter when skipping a value: quotes and brackets.
+constexpr auto kStructural = [] {
+    std::array<bool, 256> table{};
+    for (unsigned char c : {'"', '{', '}', '[', ']'})
+        table[c] = true;
+    return table;
+}();
+
 // A forward-only reader of the document's top level. It knows enough JSON to find where
 // each value ends (strings with escapes, nested brackets) without building anything.
 class Scanner {
 public:
-    explicit Scanner(const std::string& text) : text_(text) {}
+    explicit Scanner(std::string_view text) : text_(text) {}
 
     std::size_t pos = 0;
 
@@ -50,13 +59,21 @@ public:
     // Skips a string starting at pos ('"'); false when the text ends inside it.
     bool SkipString() {
         ++pos;
-        while (pos < text_.size()) {
-            char c = text_[pos++];
-            if (c == '\\') {
-                ++pos;
-            } else if (c == '"') {
-                return true;
+        const char* data = text_.data();
+        const std::size_t size = text_.size();
+        while (pos < size) {
+            // Jump to the next quote; a backslash before it may escape it.
+            const void* quote = std::memchr(data + pos, '"', size - pos);
+            if (!quote) {
+                pos = size;
+                return false;
             }
+            std::size_t at = static_cast<std::size_t>(static_cast<const char*>(quote) - data);
+            std::size_t backslashes = 0;
+            while (at - backslashes > pos && data[at - backslashes - 1] == '\\')
+                ++backslashes;
+            pos = at + 1;
+            if (backslashes % 2 == 0) return true;
         }
         return false;
     }
@@ -67,8 +84,14 @@ public:
         if (c == '"') return SkipString() ? std::string() : "truncated";
         if (c == '{' || c == '[') {
             std::vector<char> closers;
-            while (pos < text_.size()) {
-                c = text_[pos];
+            const char* data = text_.data();
+            const std::size_t size = text_.size();
+            while (pos < size) {
+                c = data[pos];
+                if (!kStructural[static_cast<unsigned char>(c)]) {
+                    ++pos;
+                    continue;
+                }
                 if (c == '"') {
                     if (!SkipString()) return "truncated";
                     continue;
@@ -96,12 +119,23 @@ public:
     }
 
 private:
-    const std::string& text_;
+    std::string_view text_;
 };
 
 }  // namespace
 
-Store::Store(std::string text, std::string origin) : text_(std::move(text)), origin_(std::move(origin)) {
+Store::Store(std::string text, std::string origin) : owned_(std::move(text)), origin_(std::move(origin)) {
+    text_ = owned_;
+    for (const auto* kind : AllSections()) {
+        Slot slot;
+        slot.kind = kind;
+        slots_.push_back(std::move(slot));
+    }
+    Scan();
+}
+
+Store::Store(FileText text, std::string origin) : file_(std::move(text)), origin_(std::move(origin)) {
+    text_ = std::string_view(file_.block.get(), file_.size);
     for (const auto* kind : AllSections()) {
         Slot slot;
         slot.kind = kind;
@@ -132,7 +166,7 @@ void Store::Scan() {
             if (scan.Peek() != '"') Refuse("expected a section name at byte " + std::to_string(scan.pos));
             std::size_t keyStart = scan.pos + 1;
             if (!scan.SkipString()) truncated();
-            std::string key = text_.substr(keyStart, scan.pos - 1 - keyStart);
+            std::string key(text_.substr(keyStart, scan.pos - 1 - keyStart));
             current = "section " + Quote(key);
             scan.SkipBlanks();
             if (scan.AtEnd()) truncated();
@@ -148,7 +182,7 @@ void Store::Scan() {
             if (key == "version") {
                 if (versionSeen) Refuse("\"version\" appears twice");
                 versionSeen = true;
-                std::string value = text_.substr(valueStart, valueEnd - valueStart);
+                std::string value(text_.substr(valueStart, valueEnd - valueStart));
                 if (value != std::to_string(kDocumentVersion)) {
                     Refuse("unsupported version " + Quote(value) + " (this program reads version " +
                            std::to_string(kDocumentVersion) + ")");
@@ -193,9 +227,7 @@ SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
     if (!slot->data) {
         try {
             slot->data =
-                slot->present
-                    ? kind.Parse(std::string_view(text_).substr(slot->begin, slot->end - slot->begin))
-                    : kind.Empty();
+                slot->present ? kind.Parse(text_.substr(slot->begin, slot->end - slot->begin)) : kind.Empty();
         } catch (const SectionFault& fault) {
             Refuse(fault.what());
         }
@@ -226,12 +258,17 @@ void Store::RewriteAll() {
         Get(*slot.kind, true);
 }
 
+std::string_view Store::Raw(const Slot& slot) const {
+    if (slot.committed) return *slot.committed;
+    return text_.substr(slot.begin, slot.end - slot.begin);
+}
+
 bool Store::HasChanges() const {
     for (const auto& slot : slots_) {
         if (!slot.data || !slot.dirty) continue;
         std::string now = slot.kind->Serialize(*slot.data);
         if (slot.present) {
-            if (std::string_view(text_).substr(slot.begin, slot.end - slot.begin) != now) return true;
+            if (Raw(slot) != now) return true;
         } else if (now != slot.kind->Serialize(*slot.kind->Empty())) {
             return true;
         }
@@ -239,30 +276,59 @@ bool Store::HasChanges() const {
     return false;
 }
 
-std::string Store::Export() const {
-    std::string out = "{\"version\":" + std::to_string(kDocumentVersion);
-    for (const auto& slot : slots_) {
+Store::Snapshot Store::TakeSnapshot() const {
+    Snapshot snapshot;
+    snapshot.serialized.resize(slots_.size());
+    snapshot.names.reserve(slots_.size());
+    snapshot.pieces.push_back(kHeader);
+    for (std::size_t i = 0; i < slots_.size(); ++i) {
+        const auto& slot = slots_[i];
+        std::string_view content;
         if (slot.data && slot.dirty) {
-            out += ",\n\"";
-            out += slot.kind->Name();
-            out += "\":";
-            out += slot.kind->Serialize(*slot.data);
+            snapshot.serialized[i] = slot.kind->Serialize(*slot.data);
+            content = *snapshot.serialized[i];
         } else if (slot.present) {
-            out += ",\n\"";
-            out += slot.kind->Name();
-            out += "\":";
-            out.append(text_, slot.begin, slot.end - slot.begin);
+            content = Raw(slot);
+        } else {
+            continue;
         }
+        snapshot.names.push_back(",\n\"" + std::string(slot.kind->Name()) + "\":");
+        snapshot.pieces.push_back(snapshot.names.back());
+        snapshot.pieces.push_back(content);
     }
-    out += "\n}\n";
+    snapshot.pieces.push_back(kTrailer);
+    return snapshot;
+}
+
+void Store::Committed(Snapshot snapshot) {
+    for (std::size_t i = 0; i < slots_.size(); ++i) {
+        if (!snapshot.serialized[i]) continue;
+        slots_[i].committed = std::make_unique<std::string>(std::move(*snapshot.serialized[i]));
+        slots_[i].present = true;
+        slots_[i].dirty = false;
+    }
+}
+
+std::string Store::Export() const {
+    Snapshot snapshot = TakeSnapshot();
+    std::size_t size = 0;
+    for (auto piece : snapshot.pieces)
+        size += piece.size();
+    std::string out;
+    out.reserve(size);
+    for (auto piece : snapshot.pieces)
+        out.append(piece);
     return out;
 }
 
 void Store::Rebase(std::string text) {
-    text_ = std::move(text);
+    owned_ = std::move(text);
+    file_ = FileText();
+    text_ = owned_;
     for (auto& slot : slots_) {
         slot.present = false;
         slot.dirty = false;
+        slot.committed.reset();
     }
     Scan();
 }

@@ -2,8 +2,11 @@
 // the sections parsed so far.
 #pragma once
 
+#include <cstdlib>
 #include <memory>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "core/section.h"
@@ -13,15 +16,26 @@ namespace TknCtl::Lib {
 // The document's format version.
 constexpr int kDocumentVersion = 1;
 
+// The bytes of a document read from a file, in a block of memory from std::malloc or
+// std::aligned_alloc.
+struct FileText {
+    struct Free {
+        void operator()(char* block) const { std::free(block); }
+    };
+    std::unique_ptr<char, Free> block;
+    std::size_t size = 0;
+};
+
 class Store {
 public:
     // Scans text: it must be one complete JSON object whose members are "version" (equal to
     // kDocumentVersion) and known sections, each at most once. Sections are not parsed yet.
     // Throws HostCtl::Lib::StateFileError whose message begins with origin.
     Store(std::string text, std::string origin);
+    Store(FileText text, std::string origin);
 
     const std::string& Origin() const { return origin_; }
-    const std::string& Text() const { return text_; }
+    std::string_view Text() const { return text_; }
 
     // The section's content, parsed and checked on first use (a missing section is empty).
     // forWrite marks it changed. Throws StateFileError when it is not acceptable.
@@ -34,6 +48,16 @@ public:
     // True when a section was changed: its content now serialises differently from what the
     // document holds (a section written back unchanged, or only re-formatted, is no change).
     bool HasChanges() const;
+    // The document with the current content of every section, as the pieces of text that
+    // make it up (they stay valid while the snapshot and this store are unchanged).
+    struct Snapshot {
+        std::vector<std::optional<std::string>> serialized;  // per section, when re-serialised
+        std::vector<std::string> names;                      // the text before each section
+        std::vector<std::string_view> pieces;
+    };
+    Snapshot TakeSnapshot() const;
+    // After a snapshot was written: its re-serialised sections are the document's now.
+    void Committed(Snapshot snapshot);
     // The document with the current content of every section.
     std::string Export() const;
     // Makes text (an export of this store) the new base text; nothing is changed after it.
@@ -47,12 +71,21 @@ private:
         bool present = false;
         bool dirty = false;
         std::unique_ptr<SectionData> data;
+        std::unique_ptr<std::string> committed;  // the section's text since the last commit
     };
+
+    static constexpr std::string_view kHeader = "{\"version\":1";
+    static constexpr std::string_view kTrailer = "\n}\n";
+
+    // The section's text in the document as last read or committed.
+    std::string_view Raw(const Slot& slot) const;
 
     void Scan();
     [[noreturn]] void Refuse(const std::string& fault) const;
 
-    std::string text_;
+    std::string owned_;  // the text, when it came as a string
+    FileText file_;      // the text, when it was read from a file
+    std::string_view text_;
     std::string origin_;
     std::vector<Slot> slots_;  // in the order of AllSections()
 };

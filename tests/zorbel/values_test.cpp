@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "zorbel/autocli.h"
+#include "zorbel/formatter.h"
 #include "zorbel/metaobj.h"
 
 using namespace Zorbel::MetaObj;
@@ -93,4 +94,28 @@ TEST(Tree, CommandsAreLeafNodesWithPaths) {
     EXPECT_TRUE(root->HasNamespaceNode("storage"));
     EXPECT_EQ(root->GetNamespaceNodeNames(), (std::vector<std::string>{"network", "storage"}));
     (void)created;
+}
+
+TEST(Formatters, GenericTableColumnsLeaveNestedRecordsWhole) {
+    // "table-columns" without a record name selects the outer record's fields; a nested record
+    // whose fields it does not name shows all of its own.
+    auto inner = MetaStruct::New("Inner");
+    inner->SetField("Id", "7");
+    inner->SetField("Up", true);
+    auto items = MetaList::New(3, inner);
+    items->Add(inner);
+    auto outer = MetaStruct::New("Outer");
+    outer->SetField("Name", "a");
+    outer->SetField("Hidden", 1);
+    outer->SetField("Items", items);
+    auto root = MetaList::New(3, outer);
+    root->Add(outer);
+    Zorbel::Format::OutputParameters parameters;
+    parameters.Set("table-columns", "Name,Items");
+    std::string out;
+    Zorbel::Format::Render("simple", *root, parameters, out);
+    EXPECT_EQ(out, "Name: a\nItems:\n   Id: 7\n   Up: true\n");
+    out.clear();
+    Zorbel::Format::Render("table", *root, parameters, out);
+    EXPECT_EQ(out, "Name  Items\n----  ---------------\na     Id: 7, Up: true\n");
 }

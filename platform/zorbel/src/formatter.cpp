@@ -128,14 +128,17 @@ public:
     std::vector<const MetaStruct::Field*> ShownFields(const MetaStruct& record) const {
         std::optional<std::string> list;
         const std::string& name = record.GetName();
+        // "table-columns" names no record: it serves the records whose fields it names, and
+        // leaves others (records nested in them) to show every field.
+        bool generic = false;
         if (table_) {
             list = parameters_.Get("table-columns:" + name);
-            if (!list) list = parameters_.Get("table-columns");
+            if (!list) generic = static_cast<bool>(list = parameters_.Get("table-columns"));
             if (!list) list = parameters_.Get("fields:" + name);
         } else {
             list = parameters_.Get("fields:" + name);
             if (!list) list = parameters_.Get("table-columns:" + name);
-            if (!list) list = parameters_.Get("table-columns");
+            if (!list) generic = static_cast<bool>(list = parameters_.Get("table-columns"));
         }
         std::vector<const MetaStruct::Field*> shown;
         const auto& fields = record.GetFields();
@@ -156,6 +159,10 @@ public:
                 }
             }
             start = comma + 1;
+        }
+        if (generic && shown.empty()) {
+            for (const auto& field : fields)
+                shown.push_back(&field);
         }
         return shown;
     }

@@ -217,6 +217,62 @@ Node Save(const DvSwitchesSection& section) {
     return out;
 }
 
+bool Contains(const std::vector<std::string>& names, const std::string& name) {
+    for (const auto& n : names) {
+        if (n == name) return true;
+    }
+    return false;
+}
+
+// LACP hangs together with the switch: LAG members are uplinks of the switch, a running LAG
+// is a configured one and its members are configured members of it.
+void CheckLacp(const DvSwitch& s, const std::string& where, Lib::Checker& checker) {
+    const auto& lacp = s.lacp;
+    for (const auto& u : lacp.uplinks) {
+        if (!u.nic.empty() && !Contains(s.uplinks, u.nic)) {
+            checker.Fail(where + "LACP uplink " + Lib::Quote(u.name) + " uses NIC " + Lib::Quote(u.nic) +
+                         ", which is not an uplink of the switch");
+        }
+        if (lacp.form == kLacpSwitchWide && u.portId.empty()) {
+            checker.Fail(where + "LACP uplink " + Lib::Quote(u.name) + " has no port");
+        }
+    }
+    if (lacp.form != kLacpMultipleLag && !lacp.lags.empty()) {
+        checker.Fail(where + "LAGs are configured but the LACP form is not \"multipleLag\"");
+    }
+    RequireUnique(
+        lacp.status, [](const LagStatus& l) { return std::to_string(l.lagId); }, checker, "running LAG ID");
+    for (const auto& running : lacp.status) {
+        std::string lag = where + "running LAG " + std::to_string(running.lagId) + ": ";
+        std::vector<std::string> members;
+        if (lacp.form == kLacpMultipleLag) {
+            const Lag* config = nullptr;
+            for (const auto& l : lacp.lags) {
+                if (l.id == running.lagId) config = &l;
+            }
+            if (!config) checker.Fail(lag + "no LAG of that ID is configured");
+            for (std::uint32_t i = 0; i < config->uplinkCount; ++i) {
+                for (const auto& u : lacp.uplinks) {
+                    if (u.name == config->name + "-" + std::to_string(i)) members.push_back(u.nic);
+                }
+            }
+        } else if (lacp.form == kLacpSwitchWide) {
+            if (running.lagId != 0) checker.Fail(lag + "the switch-wide LAG has ID 0");
+            for (const auto& u : lacp.uplinks)
+                members.push_back(u.nic.empty() ? u.name : u.nic);
+        } else {
+            checker.Fail(lag + "LACP is not configured on the switch");
+        }
+        RequireUnique(
+            running.members, [](const LacpMember& m) { return m.nic; }, checker, "LAG member NIC");
+        for (const auto& m : running.members) {
+            if (!Contains(members, m.nic)) {
+                checker.Fail(lag + "member " + Lib::Quote(m.nic) + " is not a configured uplink of the LAG");
+            }
+        }
+    }
+}
+
 void Check(const DvSwitchesSection& section, Lib::Checker& checker) {
     RequireUnique(
         section.switches, [](const DvSwitch& s) { return s.name; }, checker, "distributed switch name");
@@ -252,6 +308,7 @@ void Check(const DvSwitchesSection& section, Lib::Checker& checker) {
                              std::to_string(lag.loadBalancing) + " (0-20)");
             }
         }
+        CheckLacp(s, where, checker);
     }
 }
 

@@ -123,9 +123,23 @@ void Check(const PortsSection& section, Lib::Checker& checker) {
                 checker.Fail(where + "port group " + Lib::Quote(p.portGroup) + " is not on " +
                              Lib::Quote(p.switchName));
             }
+            if (p.type == kPortVm && p.portGroup.empty())
+                checker.Fail(where + "a VM port needs a port group");
         } else if (const auto* dvs = dvswitches.Find(p.switchName)) {
-            if (!p.dvPortId.empty() && !dvs->FindPort(p.dvPortId)) {
+            const auto* dvPort = p.dvPortId.empty() ? nullptr : dvs->FindPort(p.dvPortId);
+            if (!p.dvPortId.empty() && !dvPort) {
                 checker.Fail(where + "unknown distributed port " + Lib::Quote(p.dvPortId));
+            }
+            if (p.type == kPortVm && (!dvPort || dvPort->portgroupId.empty())) {
+                checker.Fail(where + "a VM port needs a distributed port of a distributed port group");
+            }
+            // Distributed switches keep their uplinks; a port's team uplink is one of them.
+            bool onSwitch = false;
+            for (const auto& uplink : dvs->uplinks)
+                onSwitch = onSwitch || uplink == p.teamUplink;
+            if (!p.teamUplink.empty() && !onSwitch) {
+                checker.Fail(where + "team uplink " + Lib::Quote(p.teamUplink) + " is not an uplink of " +
+                             Lib::Quote(p.switchName));
             }
         } else {
             checker.Fail(where + "unknown switch " + Lib::Quote(p.switchName));

@@ -45,7 +45,65 @@ void Put(Node& node, const char* key, const std::optional<T>& value) {
     if (value) node[key] = *value;
 }
 
+template <class T>
+void Lay(std::optional<T>& base, const std::optional<T>& over) {
+    if (over) base = over;
+}
+
 }  // namespace
+
+TeamingPolicy Overlay(const TeamingPolicy& base, const TeamingPolicy& over) {
+    TeamingPolicy out = base;
+    Lay(out.policy, over.policy);
+    Lay(out.notifySwitches, over.notifySwitches);
+    Lay(out.rollingRestoration, over.rollingRestoration);
+    Lay(out.linkCriteria, over.linkCriteria);
+    Lay(out.uplinkOrder, over.uplinkOrder);
+    Lay(out.maxActive, over.maxActive);
+    return out;
+}
+
+SecurityPolicy Overlay(const SecurityPolicy& base, const SecurityPolicy& over) {
+    SecurityPolicy out = base;
+    Lay(out.allowPromiscuous, over.allowPromiscuous);
+    Lay(out.allowMacChange, over.allowMacChange);
+    Lay(out.allowForgedTransmits, over.allowForgedTransmits);
+    return out;
+}
+
+ShapingPolicy Overlay(const ShapingPolicy& base, const ShapingPolicy& over) {
+    ShapingPolicy out = base;
+    Lay(out.enabled, over.enabled);
+    Lay(out.averageBps, over.averageBps);
+    Lay(out.peakBps, over.peakBps);
+    Lay(out.burstSize, over.burstSize);
+    return out;
+}
+
+Capabilities Overlay(const Capabilities& base, const Capabilities& over) {
+    Capabilities out = base;
+    Lay(out.csumOffload, over.csumOffload);
+    Lay(out.tcpSegmentation, over.tcpSegmentation);
+    Lay(out.zeroCopyXmit, over.zeroCopyXmit);
+    return out;
+}
+
+Capabilities LoadCapabilities(const In& in) {
+    Capabilities c;
+    c.csumOffload = in.OptBool("csumOffload");
+    c.tcpSegmentation = in.OptBool("tcpSegmentation");
+    c.zeroCopyXmit = in.OptBool("zeroCopyXmit");
+    in.Done();
+    return c;
+}
+
+Node SaveCapabilities(const Capabilities& c) {
+    Node out = Node::object();
+    Put(out, "csumOffload", c.csumOffload);
+    Put(out, "tcpSegmentation", c.tcpSegmentation);
+    Put(out, "zeroCopyXmit", c.zeroCopyXmit);
+    return out;
+}
 
 Node SavePolicy(const Policy& p) {
     Node teaming = Node::object();

@@ -50,7 +50,23 @@ struct Policy {
     ShapingPolicy shaping;
 };
 
+// The offloads a switch uses on its uplinks.
+struct Capabilities {
+    std::optional<bool> csumOffload;
+    std::optional<bool> tcpSegmentation;
+    std::optional<bool> zeroCopyXmit;
+};
+
+// The fields set in over laid over base, field by field (a port group's overrides over its
+// switch's policy; the changed fields of an update over the stored policy).
+TeamingPolicy Overlay(const TeamingPolicy& base, const TeamingPolicy& over);
+SecurityPolicy Overlay(const SecurityPolicy& base, const SecurityPolicy& over);
+ShapingPolicy Overlay(const ShapingPolicy& base, const ShapingPolicy& over);
+Capabilities Overlay(const Capabilities& base, const Capabilities& over);
+
 Policy LoadPolicy(const Json::In& in);
 nlohmann::ordered_json SavePolicy(const Policy& policy);
+Capabilities LoadCapabilities(const Json::In& in);
+nlohmann::ordered_json SaveCapabilities(const Capabilities& capabilities);
 
 }  // namespace TknCtl::Model

@@ -1,7 +1,10 @@
 #include "model/vswitches.h"
 
+#include <algorithm>
+
 #include "model/dvswitches.h"
 #include "model/pnics.h"
+#include "model/tknnics.h"
 #include "model/values.h"
 
 namespace TknCtl::Model {
@@ -35,6 +38,10 @@ const PortGroup* VSwitchesSection::FindPortGroup(const std::string& portGroup) c
     return nullptr;
 }
 
+PortGroup* VSwitchesSection::FindPortGroup(const std::string& portGroup) {
+    return const_cast<PortGroup*>(static_cast<const VSwitchesSection*>(this)->FindPortGroup(portGroup));
+}
+
 namespace {
 
 using Json::In;
@@ -59,6 +66,8 @@ void Load(const In& in, VSwitchesSection& section) {
         }
         s.uplinks = item.Strings("uplinks");
         if (auto policy = item.OptMember("policy")) s.policy = LoadPolicy(*policy);
+        if (auto capabilities = item.OptMember("capabilities"))
+            s.capabilities = LoadCapabilities(*capabilities);
         item.Each("portGroups", [&](const In& pg) {
             PortGroup group;
             group.name = pg.Str("name");
@@ -97,9 +106,27 @@ Node Save(const VSwitchesSection& section) {
                          {"requiredBy", s.beacon.requiredBy}}},
                        {"uplinks", s.uplinks},
                        {"policy", SavePolicy(s.policy)},
+                       {"capabilities", SaveCapabilities(s.capabilities)},
                        {"portGroups", std::move(groups)}});
     }
     return out;
+}
+
+// A teaming order names uplinks of the switch, each once; the active count is not negative.
+void CheckTeaming(const TeamingPolicy& teaming, const VSwitch& s, const std::string& where,
+                  Lib::Checker& checker) {
+    if (teaming.uplinkOrder) {
+        for (const auto& name : *teaming.uplinkOrder) {
+            if (std::find(s.uplinks.begin(), s.uplinks.end(), name) == s.uplinks.end())
+                checker.Fail(where + "teaming order names " + Lib::Quote(name) +
+                             ", not an uplink of the switch");
+        }
+        RequireUnique(
+            *teaming.uplinkOrder, [](const std::string& u) { return u; }, checker,
+            "uplink in a teaming order");
+    }
+    if (teaming.maxActive && *teaming.maxActive < 0)
+        checker.Fail(where + "negative number of active uplinks");
 }
 
 void Check(const VSwitchesSection& section, Lib::Checker& checker) {
@@ -107,15 +134,23 @@ void Check(const VSwitchesSection& section, Lib::Checker& checker) {
         section.switches, [](const VSwitch& s) { return s.name; }, checker, "switch name");
     std::vector<std::string> groups;
     std::vector<std::string> uplinks;
+    std::uint64_t hostPorts = 0;
     const auto& pnics = checker.Get<PnicsSection>();
     const auto& dvswitches = checker.Get<DvSwitchesSection>();
     for (const auto& s : section.switches) {
         RequireName(s.name, checker, "switch name");
         std::string where = "switch " + Lib::Quote(s.name) + ": ";
         if (dvswitches.Find(s.name)) checker.Fail(where + "a distributed switch has the same name");
+        if (s.numPorts < 1 || s.numPorts > kMaxSwitchPorts)
+            checker.Fail(where + std::to_string(s.numPorts) + " ports (1 to 4096)");
         if (s.usedPorts > s.numPorts) checker.Fail(where + "more ports in use than it has");
+        if (s.mtu < kMinMtu || s.mtu > kMaxMtu)
+            checker.Fail(where + "MTU " + std::to_string(s.mtu) + " (1280 to 9000)");
+        hostPorts += s.numPorts;
+        CheckTeaming(s.policy.teaming, s, where, checker);
         for (const auto& g : s.portGroups) {
             RequireName(g.name, checker, "port group name");
+            CheckTeaming(g.policy.teaming, s, where + "port group " + Lib::Quote(g.name) + ": ", checker);
             if (g.vlanId > kMaxVlanId) {
                 checker.Fail(where + "port group " + Lib::Quote(g.name) + " has VLAN ID " +
                              std::to_string(g.vlanId) + " (at most 4095)");
@@ -128,8 +163,13 @@ void Check(const VSwitchesSection& section, Lib::Checker& checker) {
             uplinks.push_back(uplink);
         }
     }
-    for (const auto& d : dvswitches.switches)
+    for (const auto& d : dvswitches.switches) {
         uplinks.insert(uplinks.end(), d.uplinks.begin(), d.uplinks.end());
+        hostPorts += d.numPorts;
+    }
+    if (hostPorts > kMaxHostPorts) {
+        checker.Fail("the switches have " + std::to_string(hostPorts) + " ports together (at most 4608)");
+    }
     RequireUnique(
         groups, [](const std::string& g) { return g; }, checker, "port group name");
     RequireUnique(

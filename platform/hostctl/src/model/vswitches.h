@@ -15,6 +15,9 @@ namespace TknCtl::Model {
 inline const char* const kCdpStatusNames[] = {"down", "listen", "advertise", "both"};
 
 constexpr std::uint16_t kMaxVlanId = 4095;
+// Ports of one standard switch, and of all switches of the host together.
+constexpr std::uint32_t kMaxSwitchPorts = 4096;
+constexpr std::uint32_t kMaxHostPorts = 4608;
 
 struct PortGroup {
     std::string name;
@@ -41,6 +44,7 @@ struct VSwitch {
     Beacon beacon;
     std::vector<std::string> uplinks;  // physical NIC names
     Policy policy;                     // the switch's stored policy
+    Capabilities capabilities;         // offloads used on the uplinks
     std::vector<PortGroup> portGroups;
 };
 
@@ -53,6 +57,7 @@ struct VSwitchesSection {
     // The switch holding the port group, or nullptr; port-group names are unique host-wide.
     const VSwitch* FindPortGroupSwitch(const std::string& portGroup) const;
     const PortGroup* FindPortGroup(const std::string& portGroup) const;
+    PortGroup* FindPortGroup(const std::string& portGroup);
 };
 
 }  // namespace TknCtl::Model

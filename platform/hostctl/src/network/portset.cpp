@@ -7,6 +7,7 @@
 #include "hostctl/exception.h"
 #include "hostctl/network/dvs.h"
 #include "hostctl/network/network_info.h"
+#include "hostctl/network/vswitch.h"
 #include "model/dvswitches.h"
 #include "model/ports.h"
 #include "model/tknnics.h"
@@ -40,57 +41,9 @@ std::vector<std::unique_ptr<HostCtl::Network::Port>> PortsOfSwitch(const std::st
     return ports;
 }
 
-namespace {
-
-// A standard switch seen as a port set.
-class StandardPortset : public HostCtl::Network::Portset, public Lib::TknCtlObject {
-public:
-    explicit StandardPortset(std::string name) : name_(std::move(name)) {}
-
-    std::string GetName() const override {
-        Enter("GetName");
-        return name_;
-    }
-    std::string GetClassName() const override { return Switch("GetClassName").className; }
-    std::uint32_t GetNumPorts() const override { return Switch("GetNumPorts").numPorts; }
-    std::uint32_t GetNumUsedPorts() const override { return Switch("GetNumUsedPorts").usedPorts; }
-    std::uint32_t GetNumConfiguredPorts() const override {
-        return Switch("GetNumConfiguredPorts").configuredPorts;
-    }
-    int GetMtu() const override { return static_cast<int>(Switch("GetMtu").mtu); }
-    std::string GetCdpStatus() const override { return CdpStatusText(Switch("GetCdpStatus").cdpStatus); }
-    std::vector<std::string> GetUplinkNames() const override { return Switch("GetUplinkNames").uplinks; }
-    std::vector<std::unique_ptr<HostCtl::Network::Port>> GetPorts() const override {
-        Switch("GetPorts");
-        return PortsOfSwitch(name_);
-    }
-    std::vector<HostCtl::Network::VlanStats> GetVlanStats(const std::string& uplink) const override {
-        Enter("GetVlanStats", uplink);
-        return UplinkVlanStats(name_, uplink);
-    }
-    void SetVlanStatsEnabled(const std::string& uplink, bool enabled) override {
-        Enter("SetVlanStatsEnabled", Lib::Args(uplink, enabled));
-        SetUplinkVlanStatsEnabled(name_, uplink, enabled);
-    }
-
-private:
-    void Enter(const char* operation, const std::string& arguments = {}) const {
-        Lib::Enter(std::string("HostCtl::Network::Portset::") + operation, name_, arguments);
-    }
-    const Model::VSwitch& Switch(const char* operation) const {
-        Enter(operation);
-        const auto* vswitch = Lib::Read<Model::VSwitchesSection>().Find(name_);
-        if (!vswitch) throw HostCtlException("Virtual switch " + name_ + " does not exist");
-        return *vswitch;
-    }
-
-    std::string name_;
-};
-
-}  // namespace
-
+// A standard switch answers as a port set through its own object (vswitch.cpp).
 std::unique_ptr<HostCtl::Network::Portset> MakeStandardPortset(const std::string& name) {
-    return std::make_unique<StandardPortset>(name);
+    return std::make_unique<VirtualSwitchImpl>(name);
 }
 
 }  // namespace Internal
@@ -117,41 +70,13 @@ std::uint32_t PortImpl::GetPortId() const {
     Lib::Enter("HostCtl::Network::Port::GetPortId", std::to_string(portId_));
     return portId_;
 }
-std::uint32_t PortImpl::GetClientWorldId() const {
-    return EnterPort("GetClientWorldId", portId_).worldId;
-}
-int PortImpl::GetPortType() const {
-    return static_cast<int>(EnterPort("GetPortType", portId_).type);
-}
-std::string PortImpl::GetPortGroupName() const {
-    return EnterPort("GetPortGroupName", portId_).portGroup;
-}
-std::string PortImpl::GetDVPortId() const {
-    return EnterPort("GetDVPortId", portId_).dvPortId;
-}
-HostCtl::Network::MacAddress PortImpl::GetMacAddress() const {
-    return EnterPort("GetMacAddress", portId_).mac;
-}
-HostCtl::Network::Ipv4Address PortImpl::GetIpAddress() const {
-    return EnterPort("GetIpAddress", portId_).ipv4;
-}
-// A team uplink follows its switch: when the NIC recorded for the port is no longer an uplink
-// of the switch, the port's traffic has failed over to the switch's first uplink (none left:
-// no team uplink). A switch's own uplink ports have no team uplink.
-std::string PortImpl::GetTeamUplink() const {
-    const auto& port = EnterPort("GetTeamUplink", portId_);
-    if (port.type == Model::kPortUplink || port.teamUplink.empty()) return {};
-    const std::vector<std::string>* uplinks = nullptr;
-    if (const auto* vswitch = Lib::Read<Model::VSwitchesSection>().Find(port.switchName)) {
-        uplinks = &vswitch->uplinks;
-    } else if (const auto* dvs = Lib::Read<Model::DvSwitchesSection>().Find(port.switchName)) {
-        uplinks = &dvs->uplinks;
-    }
-    if (!uplinks || uplinks->empty()) return {};
-    if (std::find(uplinks->begin(), uplinks->end(), port.teamUplink) != uplinks->end())
-        return port.teamUplink;
-    return uplinks->front();
-}
+std::uint32_t PortImpl::GetClientWorldId() const { return EnterPort("GetClientWorldId", portId_).worldId; }
+int PortImpl::GetPortType() const { return static_cast<int>(EnterPort("GetPortType", portId_).type); }
+std::string PortImpl::GetPortGroupName() const { return EnterPort("GetPortGroupName", portId_).portGroup; }
+std::string PortImpl::GetDVPortId() const { return EnterPort("GetDVPortId", portId_).dvPortId; }
+HostCtl::Network::MacAddress PortImpl::GetMacAddress() const { return EnterPort("GetMacAddress", portId_).mac; }
+HostCtl::Network::Ipv4Address PortImpl::GetIpAddress() const { return EnterPort("GetIpAddress", portId_).ipv4; }
+std::string PortImpl::GetTeamUplink() const { return EnterPort("GetTeamUplink", portId_).teamUplink; }
 
 HostCtl::Network::PacketStats PortImpl::GetPacketStats() const {
     const auto& stats = EnterPort("GetPacketStats", portId_).stats;
@@ -207,16 +132,15 @@ const Model::DvPort& EnterDvPort(const char* operation, const HostCtl::Network::
     Lib::Enter(std::string("TknCtl::Network::DVPortImpl::") + operation, param.GetPortId(), arguments);
     const auto* port = LookupDvPort(param, nullptr);
     if (!port) {
-        throw HostCtlException("Distributed port '" + param.GetPortId() + "' of switch '" +
-                               param.GetSwitchUuid() + "' does not exist");
+        throw HostCtlException("Distributed port '" + param.GetPortId() + "' of switch '" + param.GetSwitchUuid() +
+                               "' does not exist");
     }
     return *port;
 }
 }  // namespace
 
 DVPortImpl::DVPortImpl(const HostCtl::Network::DVPortParam& param) : param_(param) {}
-DVPortImpl::DVPortImpl(const std::string& switchUuid, const std::string& portId)
-    : param_(switchUuid, portId, 0) {}
+DVPortImpl::DVPortImpl(const std::string& switchUuid, const std::string& portId) : param_(switchUuid, portId, 0) {}
 DVPortImpl::~DVPortImpl() = default;
 
 std::string DVPortImpl::GetPortId() const {
@@ -224,9 +148,7 @@ std::string DVPortImpl::GetPortId() const {
     return param_.GetPortId();
 }
 
-std::string DVPortImpl::GetDVPortgroupId() const {
-    return EnterDvPort("GetDVPortgroupId", param_).portgroupId;
-}
+std::string DVPortImpl::GetDVPortgroupId() const { return EnterDvPort("GetDVPortgroupId", param_).portgroupId; }
 
 bool DVPortImpl::GetInUse(std::vector<std::string>& clients) const {
     const auto& port = EnterDvPort("GetInUse", param_);
@@ -271,13 +193,10 @@ HostCtl::Network::OpaqueNetworkParam DVPortImpl::GetOpaqueNetworkParam() const {
     return {};
 }
 
-std::uint32_t DVPortImpl::GetConnectionId() const {
-    return EnterDvPort("GetConnectionId", param_).connectionId;
-}
+std::uint32_t DVPortImpl::GetConnectionId() const { return EnterDvPort("GetConnectionId", param_).connectionId; }
 
 void DVPortImpl::SetConnectionId(std::uint32_t connectionId) {
-    Lib::Enter("TknCtl::Network::DVPortImpl::SetConnectionId", param_.GetPortId(),
-               std::to_string(connectionId));
+    Lib::Enter("TknCtl::Network::DVPortImpl::SetConnectionId", param_.GetPortId(), std::to_string(connectionId));
     EnterDvPort("SetConnectionId", param_);  // the port must exist before anything changes
     for (auto& dvs : Lib::Write<Model::DvSwitchesSection>().switches) {
         if (dvs.uuid != param_.GetSwitchUuid()) continue;
@@ -336,8 +255,7 @@ std::vector<std::unique_ptr<HostCtl::Network::DVSwitch>> VirtualSwitchInfoImpl::
     return switches;
 }
 
-std::unique_ptr<HostCtl::Network::DVSwitch> VirtualSwitchInfoImpl::GetDVSwitchByName(
-    const std::string& name) {
+std::unique_ptr<HostCtl::Network::DVSwitch> VirtualSwitchInfoImpl::GetDVSwitchByName(const std::string& name) {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::GetDVSwitchByName", name);
     if (!Lib::Read<Model::DvSwitchesSection>().Find(name)) return nullptr;
     return std::make_unique<DVSwitchImpl>(name);

@@ -70,13 +70,41 @@ std::uint32_t PortImpl::GetPortId() const {
     Lib::Enter("HostCtl::Network::Port::GetPortId", std::to_string(portId_));
     return portId_;
 }
-std::uint32_t PortImpl::GetClientWorldId() const { return EnterPort("GetClientWorldId", portId_).worldId; }
-int PortImpl::GetPortType() const { return static_cast<int>(EnterPort("GetPortType", portId_).type); }
-std::string PortImpl::GetPortGroupName() const { return EnterPort("GetPortGroupName", portId_).portGroup; }
-std::string PortImpl::GetDVPortId() const { return EnterPort("GetDVPortId", portId_).dvPortId; }
-HostCtl::Network::MacAddress PortImpl::GetMacAddress() const { return EnterPort("GetMacAddress", portId_).mac; }
-HostCtl::Network::Ipv4Address PortImpl::GetIpAddress() const { return EnterPort("GetIpAddress", portId_).ipv4; }
-std::string PortImpl::GetTeamUplink() const { return EnterPort("GetTeamUplink", portId_).teamUplink; }
+std::uint32_t PortImpl::GetClientWorldId() const {
+    return EnterPort("GetClientWorldId", portId_).worldId;
+}
+int PortImpl::GetPortType() const {
+    return static_cast<int>(EnterPort("GetPortType", portId_).type);
+}
+std::string PortImpl::GetPortGroupName() const {
+    return EnterPort("GetPortGroupName", portId_).portGroup;
+}
+std::string PortImpl::GetDVPortId() const {
+    return EnterPort("GetDVPortId", portId_).dvPortId;
+}
+HostCtl::Network::MacAddress PortImpl::GetMacAddress() const {
+    return EnterPort("GetMacAddress", portId_).mac;
+}
+HostCtl::Network::Ipv4Address PortImpl::GetIpAddress() const {
+    return EnterPort("GetIpAddress", portId_).ipv4;
+}
+// A team uplink follows its switch: when the NIC recorded for the port is no longer an uplink
+// of the switch, the port's traffic has failed over to the switch's first uplink (none left:
+// no team uplink). A switch's own uplink ports have no team uplink.
+std::string PortImpl::GetTeamUplink() const {
+    const auto& port = EnterPort("GetTeamUplink", portId_);
+    if (port.type == Model::kPortUplink || port.teamUplink.empty()) return {};
+    const std::vector<std::string>* uplinks = nullptr;
+    if (const auto* vswitch = Lib::Read<Model::VSwitchesSection>().Find(port.switchName)) {
+        uplinks = &vswitch->uplinks;
+    } else if (const auto* dvs = Lib::Read<Model::DvSwitchesSection>().Find(port.switchName)) {
+        uplinks = &dvs->uplinks;
+    }
+    if (!uplinks || uplinks->empty()) return {};
+    if (std::find(uplinks->begin(), uplinks->end(), port.teamUplink) != uplinks->end())
+        return port.teamUplink;
+    return uplinks->front();
+}
 
 HostCtl::Network::PacketStats PortImpl::GetPacketStats() const {
     const auto& stats = EnterPort("GetPacketStats", portId_).stats;
@@ -132,15 +160,16 @@ const Model::DvPort& EnterDvPort(const char* operation, const HostCtl::Network::
     Lib::Enter(std::string("TknCtl::Network::DVPortImpl::") + operation, param.GetPortId(), arguments);
     const auto* port = LookupDvPort(param, nullptr);
     if (!port) {
-        throw HostCtlException("Distributed port '" + param.GetPortId() + "' of switch '" + param.GetSwitchUuid() +
-                               "' does not exist");
+        throw HostCtlException("Distributed port '" + param.GetPortId() + "' of switch '" +
+                               param.GetSwitchUuid() + "' does not exist");
     }
     return *port;
 }
 }  // namespace
 
 DVPortImpl::DVPortImpl(const HostCtl::Network::DVPortParam& param) : param_(param) {}
-DVPortImpl::DVPortImpl(const std::string& switchUuid, const std::string& portId) : param_(switchUuid, portId, 0) {}
+DVPortImpl::DVPortImpl(const std::string& switchUuid, const std::string& portId)
+    : param_(switchUuid, portId, 0) {}
 DVPortImpl::~DVPortImpl() = default;
 
 std::string DVPortImpl::GetPortId() const {
@@ -148,7 +177,9 @@ std::string DVPortImpl::GetPortId() const {
     return param_.GetPortId();
 }
 
-std::string DVPortImpl::GetDVPortgroupId() const { return EnterDvPort("GetDVPortgroupId", param_).portgroupId; }
+std::string DVPortImpl::GetDVPortgroupId() const {
+    return EnterDvPort("GetDVPortgroupId", param_).portgroupId;
+}
 
 bool DVPortImpl::GetInUse(std::vector<std::string>& clients) const {
     const auto& port = EnterDvPort("GetInUse", param_);
@@ -193,10 +224,13 @@ HostCtl::Network::OpaqueNetworkParam DVPortImpl::GetOpaqueNetworkParam() const {
     return {};
 }
 
-std::uint32_t DVPortImpl::GetConnectionId() const { return EnterDvPort("GetConnectionId", param_).connectionId; }
+std::uint32_t DVPortImpl::GetConnectionId() const {
+    return EnterDvPort("GetConnectionId", param_).connectionId;
+}
 
 void DVPortImpl::SetConnectionId(std::uint32_t connectionId) {
-    Lib::Enter("TknCtl::Network::DVPortImpl::SetConnectionId", param_.GetPortId(), std::to_string(connectionId));
+    Lib::Enter("TknCtl::Network::DVPortImpl::SetConnectionId", param_.GetPortId(),
+               std::to_string(connectionId));
     EnterDvPort("SetConnectionId", param_);  // the port must exist before anything changes
     for (auto& dvs : Lib::Write<Model::DvSwitchesSection>().switches) {
         if (dvs.uuid != param_.GetSwitchUuid()) continue;
@@ -255,7 +289,8 @@ std::vector<std::unique_ptr<HostCtl::Network::DVSwitch>> VirtualSwitchInfoImpl::
     return switches;
 }
 
-std::unique_ptr<HostCtl::Network::DVSwitch> VirtualSwitchInfoImpl::GetDVSwitchByName(const std::string& name) {
+std::unique_ptr<HostCtl::Network::DVSwitch> VirtualSwitchInfoImpl::GetDVSwitchByName(
+    const std::string& name) {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::GetDVSwitchByName", name);
     if (!Lib::Read<Model::DvSwitchesSection>().Find(name)) return nullptr;
     return std::make_unique<DVSwitchImpl>(name);

@@ -38,7 +38,8 @@ namespace {
 const FirewallSection& Loaded() {
     const auto& section = Lib::Read<FirewallSection>();
     if (!section.moduleLoaded)
-        throw HostCtlException(std::string("The firewall module '") + Model::kFirewallModule + "' is not loaded");
+        throw HostCtlException(std::string("The firewall module '") + Model::kFirewallModule +
+                               "' is not loaded");
     return section;
 }
 
@@ -53,7 +54,8 @@ std::unique_ptr<HostCtl::System::FirewallRule> ToRule(const Model::FirewallRule&
                                                            rule.direction, rule.protocol);
 }
 
-std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> ToRules(const std::vector<Model::FirewallRule>& rules) {
+std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> ToRules(
+    const std::vector<Model::FirewallRule>& rules) {
     std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> out;
     out.reserve(rules.size());
     for (const auto& rule : rules)
@@ -79,8 +81,9 @@ std::string RuleText(const HostCtl::System::FirewallRule& rule) {
 Model::AllowedIp ParseOrThrow(const std::string& text) {
     auto parsed = Model::ParseAllowedIp(text);
     if (!parsed) {
-        throw HostCtlException("Invalid allowed address " + Lib::Quote(text) +
-                               ": expected an IPv4 or IPv6 address or a network in CIDR form (address/prefix length)");
+        throw HostCtlException(
+            "Invalid allowed address " + Lib::Quote(text) +
+            ": expected an IPv4 or IPv6 address or a network in CIDR form (address/prefix length)");
     }
     return *parsed;
 }
@@ -107,7 +110,8 @@ public:
 
     void RemoveClient() override {
         const auto& ruleset = Get("RemoveClient");
-        if (ruleset.clientCount <= 0) throw HostCtlException("Ruleset " + Lib::Quote(id_) + " has no clients");
+        if (ruleset.clientCount <= 0)
+            throw HostCtlException("Ruleset " + Lib::Quote(id_) + " has no clients");
         auto& changed = Writable();
         if (--changed.clientCount == 0) changed.enabled = false;
     }
@@ -123,10 +127,18 @@ public:
             auto entry = Model::ParseAllowedIp(text);
             if (!entry) continue;  // the model refuses such text when it is loaded
             switch (entry->kind) {
-                case Model::AllowedIpKind::kIpv4Address: out->AddIpv4Address(Ipv4Address(entry->text)); break;
-                case Model::AllowedIpKind::kIpv4Network: out->AddIpv4Network(Ipv4Network(entry->text)); break;
-                case Model::AllowedIpKind::kIpv6Address: out->AddIpv6Address(Ipv6Address(entry->text)); break;
-                case Model::AllowedIpKind::kIpv6Network: out->AddIpv6Network(Ipv6Network(entry->text)); break;
+                case Model::AllowedIpKind::kIpv4Address:
+                    out->AddIpv4Address(Ipv4Address(entry->text));
+                    break;
+                case Model::AllowedIpKind::kIpv4Network:
+                    out->AddIpv4Network(Ipv4Network(entry->text));
+                    break;
+                case Model::AllowedIpKind::kIpv6Address:
+                    out->AddIpv6Address(Ipv6Address(entry->text));
+                    break;
+                case Model::AllowedIpKind::kIpv6Network:
+                    out->AddIpv6Network(Ipv6Network(entry->text));
+                    break;
             }
         }
         return out;
@@ -159,7 +171,9 @@ public:
         return Loaded().Find(id_) != nullptr;
     }
 
-    void SetAllowedAll(bool allowedAll) override { Change("SetAllowedAll", Lib::Args(allowedAll)).allowedAll = allowedAll; }
+    void SetAllowedAll(bool allowedAll) override {
+        Change("SetAllowedAll", Lib::Args(allowedAll)).allowedAll = allowedAll;
+    }
     bool IsAllowedAll() override { return Get("IsAllowedAll").allowedAll; }
 
 private:
@@ -228,7 +242,8 @@ std::vector<std::unique_ptr<HostCtl::System::FirewallRuleset>> SystemInfoImpl::G
     return out;
 }
 
-std::unique_ptr<HostCtl::System::FirewallRuleset> SystemInfoImpl::GetFirewallRulesetById(const std::string& id) {
+std::unique_ptr<HostCtl::System::FirewallRuleset> SystemInfoImpl::GetFirewallRulesetById(
+    const std::string& id) {
     Lib::Enter("TknCtl::System::SystemInfoImpl::GetFirewallRulesetById", id);
     Loaded();
     return std::make_unique<FirewallRulesetImpl>(id);
@@ -258,15 +273,17 @@ void SystemInfoImpl::AddFirewallDynamicRule(HostCtl::System::FirewallRule& rule)
     Lib::Enter("TknCtl::System::SystemInfoImpl::AddFirewallDynamicRule", {}, text);
     const auto& section = Loaded();
     if (!section.filtersInstalled)
-        throw HostCtlException("Cannot add the dynamic rule " + text +
-                               ": the firewall filters are not installed (load the ruleset configuration first)");
-    if (rule.GetPortType() > 1 || rule.GetDirection() > 1 || rule.GetProtocol() > 1 || rule.GetPortEnd() > 65535 ||
-        rule.GetPortBegin() > rule.GetPortEnd())
+        throw HostCtlException(
+            "Cannot add the dynamic rule " + text +
+            ": the firewall filters are not installed (load the ruleset configuration first)");
+    if (rule.GetPortType() > 1 || rule.GetDirection() > 1 || rule.GetProtocol() > 1 ||
+        rule.GetPortEnd() > 65535 || rule.GetPortBegin() > rule.GetPortEnd())
         throw HostCtlException("Invalid dynamic rule " + text);
     Model::FirewallRule added{rule.GetPortType(), rule.GetPortBegin(), rule.GetPortEnd(), rule.GetDirection(),
                               rule.GetProtocol()};
     for (const auto& existing : section.dynamicRules) {
-        if (SameRule(existing, added)) throw HostCtlException("The dynamic rule " + text + " is already installed");
+        if (SameRule(existing, added))
+            throw HostCtlException("The dynamic rule " + text + " is already installed");
     }
     Lib::Write<FirewallSection>().dynamicRules.push_back(added);
 }

@@ -30,7 +30,8 @@ void ModuleImpl::Refresh() {
 
 void ModuleImpl::Load(const std::string& options, bool force) {
     Lib::Enter("TknCtl::System::ModuleImpl::Load", name_, Lib::Args(options, force));
-    if (!IsKnown(name_)) throw HostCtlException("Cannot load module " + Lib::Quote(name_) + ": no such module");
+    if (!IsKnown(name_))
+        throw HostCtlException("Cannot load module " + Lib::Quote(name_) + ": no such module");
     if (!options.empty()) {
         throw HostCtlException("Cannot load module " + Lib::Quote(name_) + ": it takes no options (given " +
                                Lib::Quote(options) + ")");
@@ -50,7 +51,8 @@ void ModuleImpl::Load(const std::string& options, bool force) {
 
 void ModuleImpl::Unload() {
     Lib::Enter("TknCtl::System::ModuleImpl::Unload", name_);
-    if (!IsKnown(name_)) throw HostCtlException("Cannot unload module " + Lib::Quote(name_) + ": no such module");
+    if (!IsKnown(name_))
+        throw HostCtlException("Cannot unload module " + Lib::Quote(name_) + ": no such module");
     const auto& current = Lib::Read<FirewallSection>();
     if (!current.moduleLoaded)
         throw HostCtlException("Cannot unload module " + Lib::Quote(name_) + ": it is not loaded");

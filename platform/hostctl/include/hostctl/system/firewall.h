@@ -34,9 +34,13 @@ public:
     static constexpr std::uint32_t PROTOCOL_UDP = 1;
 
     FirewallRule() = default;
-    FirewallRule(std::uint32_t portType, std::uint32_t portBegin, std::uint32_t portEnd, std::uint32_t direction,
-                 std::uint32_t protocol)
-        : portType_(portType), portBegin_(portBegin), portEnd_(portEnd), direction_(direction), protocol_(protocol) {}
+    FirewallRule(std::uint32_t portType, std::uint32_t portBegin, std::uint32_t portEnd,
+                 std::uint32_t direction, std::uint32_t protocol)
+        : portType_(portType),
+          portBegin_(portBegin),
+          portEnd_(portEnd),
+          direction_(direction),
+          protocol_(protocol) {}
     FirewallRule(const FirewallRule&) = default;
     FirewallRule& operator=(const FirewallRule&) = default;
     virtual ~FirewallRule();
@@ -82,7 +86,8 @@ public:
     void AddIpv6Network(const Network::Ipv6Network& network) { ipv6Networks_.push_back(network); }
 
     bool IsEmpty() const {
-        return ipv4Addresses_.empty() && ipv4Networks_.empty() && ipv6Addresses_.empty() && ipv6Networks_.empty();
+        return ipv4Addresses_.empty() && ipv4Networks_.empty() && ipv6Addresses_.empty() &&
+               ipv6Networks_.empty();
     }
 
 private:

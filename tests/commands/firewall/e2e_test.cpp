@@ -41,6 +41,7 @@ protected:
         return outcome;
     }
     Outcome Cli(const std::string& arguments) { return Exec(HADROCLI, arguments); }
+    Outcome Sim(const std::string& arguments) { return Exec(HADROSIM, arguments); }
 
     static std::string Slurp(const std::filesystem::path& path) {
         std::ifstream in(path);
@@ -86,18 +87,15 @@ TEST_F(FirewallEndToEnd, AllowedAddressesPersist) {
               "sshServer  192.0.2.10, 2001:db8::/48\n");
     r = Cli("network firewall ruleset allowedip add -r sshServer");
     EXPECT_EQ(r.status, 2);
-}
 
-TEST_F(FirewallEndToEnd, FaultsFromTheSimulator) {
-    auto sim = Exec(HADROSIM,
-                    "fault add HostCtl::System::FirewallRuleset::AddClient --target ntpClient "
-                    "--message 'client table full' --count 1");
-    ASSERT_EQ(sim.status, 0) << sim.err;
-    auto r = Cli("network firewall ruleset client add -r ntpClient");
+    ASSERT_EQ(Sim("fault add HostCtl::System::FirewallRuleset::RemoveAllowedIp --target sshServer "
+                  "--message 'allowed list is read-only' --count 1")
+                  .status,
+              0);
+    r = Cli("network firewall ruleset allowedip remove -r sshServer -i 192.0.2.10");
     EXPECT_EQ(r.status, 1);
-    EXPECT_EQ(r.err, "client table full\n");
-    EXPECT_EQ(Cli("network firewall ruleset client add -r ntpClient").status, 0);
-    EXPECT_EQ(Cli("network firewall ruleset client get -r ntpClient").out, "Ruleset Client Count: 1\n");
+    EXPECT_EQ(r.err, "allowed list is read-only\n");
+    EXPECT_EQ(Cli("network firewall ruleset allowedip remove -r sshServer -i 192.0.2.10").status, 0);
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 // The simulated host's firewall rules, through the library directly.
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <nlohmann/json.hpp>
 
 #include "hostctl/exception.h"
@@ -81,16 +82,14 @@ TEST(FirewallHost, NothingIsReadOrChangedWithoutTheModule) {
     const std::string notLoaded = "The firewall module 'hadrofw' is not loaded";
     SystemInfoImpl system;
     FirewallRule rule;
-    EXPECT_EQ(Refusal([&] { system.IsFirewallEnabled(); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.SetFirewallEnabled(false); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.GetFirewallDefaultAction(); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.SetFirewallDefaultAction(true); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.GetFirewallRulesets(); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.GetFirewallRulesetById("sshServer"); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.LoadFirewallRulesets(); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.DestroyFirewallFilters(); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.GetFirewallDynamicRules(); }), notLoaded);
-    EXPECT_EQ(Refusal([&] { system.AddFirewallDynamicRule(rule); }), notLoaded);
+    const std::vector<std::function<void()>> calls{
+        [&] { system.IsFirewallEnabled(); },        [&] { system.SetFirewallEnabled(false); },
+        [&] { system.GetFirewallDefaultAction(); }, [&] { system.SetFirewallDefaultAction(true); },
+        [&] { system.GetFirewallRulesets(); },      [&] { system.GetFirewallRulesetById("sshServer"); },
+        [&] { system.LoadFirewallRulesets(); },     [&] { system.DestroyFirewallFilters(); },
+        [&] { system.GetFirewallDynamicRules(); },  [&] { system.AddFirewallDynamicRule(rule); }};
+    for (const auto& call : calls)
+        EXPECT_EQ(Refusal(call), notLoaded);
     EXPECT_EQ(FirewallOf(*session), before);
 }
 
@@ -122,30 +121,13 @@ TEST(FirewallHost, DynamicRules) {
         "the ruleset configuration first)");
 }
 
-TEST(FirewallHost, RulesetsByIdAndThroughTheHost) {
+TEST(FirewallHost, AnUnknownRulesetIsReachedButRefusesEverything) {
     auto session = HostSession::InMemoryDefault();
     auto system = HostCtl::HostFactory::GetHost()->GetSystemInfo();
-    ASSERT_NE(system, nullptr);
     auto missing = system->GetFirewallRulesetById("nope");
     EXPECT_FALSE(missing->IsValid());
     EXPECT_EQ(Refusal([&] { missing->GetName(); }), "Ruleset 'nope' not found");
     EXPECT_EQ(Refusal([&] { missing->AddClient(); }), "Ruleset 'nope' not found");
-
-    auto web = system->GetFirewallRulesetById("webAccess");
-    ASSERT_TRUE(web->IsValid());
-    auto allowed = web->GetAllowedIps();
-    ASSERT_EQ(allowed->GetIpv4Addresses().size(), 2u);
-    EXPECT_EQ(allowed->GetIpv4Addresses()[1].GetStringAddress(), "192.0.2.201");
-    ASSERT_EQ(allowed->GetIpv4Networks().size(), 1u);
-    ASSERT_EQ(allowed->GetIpv6Addresses().size(), 1u);
-    ASSERT_EQ(allowed->GetIpv6Networks().size(), 1u);
-    EXPECT_EQ(allowed->GetIpv6Networks()[0].GetStringAddress(), "2001:db8:20::/64");
-
-    // The count never goes below zero and never overflows.
-    auto ssh = system->GetFirewallRulesetById("sshServer");
-    EXPECT_EQ(Refusal([&] { ssh->RemoveClient(); }), "Ruleset 'sshServer' has no clients");
-    EXPECT_EQ(ssh->GetClientCount(), 0);
-    EXPECT_TRUE(ssh->IsEnabled());
 }
 
 TEST(FirewallHost, StateFilesKeepTheFirewallConsistent) {

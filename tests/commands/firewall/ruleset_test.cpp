@@ -114,6 +114,9 @@ TEST_F(FirewallRulesetTest, AllowedIpListShowsAllOrTheKindsApart) {
               "glidex       All\n"
               "syslogRelay  2001:db8:30::/48\n");
 
+    AddFault("HostCtl::System::FirewallRuleset::GetAllowedIps", "webAccess", "allowed list unreadable", 1);
+    EXPECT_EQ(Run("network firewall ruleset allowedip list").Errors(), Strings{"allowed list unreadable"});
+
     // An empty explicit list is an empty list, not "All".
     EditFirewall([](nlohmann::json& fw) { fw["rulesets"][5]["allowedIps"] = nlohmann::json::array(); });
     EXPECT_EQ(AllowedIps("syslogRelay"), nlohmann::json::array());

@@ -1,5 +1,9 @@
 #include "model/pnics.h"
 
+#include <algorithm>
+
+#include "hostctl/exception.h"
+
 #include "model/values.h"
 #include "model/worlds.h"
 
@@ -14,6 +18,32 @@ const Pnic* PnicsSection::Find(const std::string& name) const {
 
 Pnic* PnicsSection::Find(const std::string& name) {
     return const_cast<Pnic*>(static_cast<const PnicsSection*>(this)->Find(name));
+}
+
+const Pnic& ReadPnic(const std::string& name) {
+    const auto* nic = Lib::Read<PnicsSection>().Find(name);
+    if (!nic) throw HostCtl::Lib::HostCtlException("Physical NIC " + name + " does not exist");
+    return *nic;
+}
+
+Pnic& WritePnic(const std::string& name) {
+    ReadPnic(name);
+    return *Lib::Write<PnicsSection>().Find(name);
+}
+
+void ResolvePause(Pnic& nic) {
+    auto& pause = nic.pause;
+    if (pause.supported && pause.autoNegotiate && nic.settings.autoNegotiation && nic.linkUp) {
+        pause.rxResolution = pause.rx ? 1 : 2;
+        pause.txResolution = pause.tx ? 1 : 2;
+    } else {
+        pause.rxResolution = 0;
+        pause.txResolution = 0;
+    }
+}
+
+bool Supports(const Pnic& nic, const char* feature) {
+    return std::find(nic.unsupported.begin(), nic.unsupported.end(), feature) == nic.unsupported.end();
 }
 
 namespace {
@@ -147,24 +177,36 @@ std::vector<std::uint32_t> Codes(const In& in, const char* key) {
     return codes;
 }
 
-PnicSettings LoadSettings(const In& in) {
-    PnicSettings s;
-    s.supportedPorts = Codes(in, "supportedPorts");
-    s.supportsAutoNegotiation = in.Bool("supportsAutoNegotiation", s.supportsAutoNegotiation);
-    in.Each("advertisedModes", [&](const In& item) {
+std::vector<LinkMode> Modes(const In& in, const char* key) {
+    std::vector<LinkMode> modes;
+    in.Each(key, [&](const In& item) {
         LinkMode mode;
         mode.speed = item.Int<std::uint32_t>("speed", 0);
         mode.duplex = item.Int<std::uint32_t>("duplex", 0);
         mode.media = item.Int<std::uint32_t>("media", 0);
         item.Done();
-        s.advertisedModes.push_back(mode);
+        modes.push_back(mode);
     });
+    return modes;
+}
+
+PnicSettings LoadSettings(const In& in) {
+    PnicSettings s;
+    s.supportedPorts = Codes(in, "supportedPorts");
+    s.supportsAutoNegotiation = in.Bool("supportsAutoNegotiation", s.supportsAutoNegotiation);
+    s.advertisedModes = Modes(in, "advertisedModes");
+    s.supportedModes = in.Has("supportedModes") ? Modes(in, "supportedModes") : s.advertisedModes;
     s.advertisedAutoNegotiation = in.Bool("advertisedAutoNegotiation", s.advertisedAutoNegotiation);
     s.port = in.Int<std::uint32_t>("port", 0);
     s.phyAddress = in.Int<std::uint32_t>("phyAddress", 0);
     s.transceiver = in.Int<std::uint32_t>("transceiver", 0);
     s.autoNegotiation = in.Bool("autoNegotiation", s.autoNegotiation);
     s.supportsWakeOn = in.Bool("supportsWakeOn", false);
+    if (in.Has("supportedWakeOn")) {
+        s.supportedWakeOn = Codes(in, "supportedWakeOn");
+    } else if (s.supportsWakeOn) {
+        s.supportedWakeOn = {0, 1, 2, 3, 4, 5, 6};
+    }
     s.wakeOn = Codes(in, "wakeOn");
     s.supportsMessageLevel = in.Bool("supportsMessageLevel", s.supportsMessageLevel);
     s.messageLevel = in.Int<std::uint32_t>("messageLevel", 0);
@@ -173,20 +215,25 @@ PnicSettings LoadSettings(const In& in) {
     return s;
 }
 
+Node SaveModes(const std::vector<LinkMode>& modes) {
+    Node out = Node::array();
+    for (const auto& mode : modes)
+        out.push_back({{"speed", mode.speed}, {"duplex", mode.duplex}, {"media", mode.media}});
+    return out;
+}
+
 Node SaveSettings(const PnicSettings& s) {
-    Node modes = Node::array();
-    for (const auto& mode : s.advertisedModes) {
-        modes.push_back({{"speed", mode.speed}, {"duplex", mode.duplex}, {"media", mode.media}});
-    }
     return Node{{"supportedPorts", s.supportedPorts},
                 {"supportsAutoNegotiation", s.supportsAutoNegotiation},
-                {"advertisedModes", std::move(modes)},
+                {"supportedModes", SaveModes(s.supportedModes)},
+                {"advertisedModes", SaveModes(s.advertisedModes)},
                 {"advertisedAutoNegotiation", s.advertisedAutoNegotiation},
                 {"port", s.port},
                 {"phyAddress", s.phyAddress},
                 {"transceiver", s.transceiver},
                 {"autoNegotiation", s.autoNegotiation},
                 {"supportsWakeOn", s.supportsWakeOn},
+                {"supportedWakeOn", s.supportedWakeOn},
                 {"wakeOn", s.wakeOn},
                 {"supportsMessageLevel", s.supportsMessageLevel},
                 {"messageLevel", s.messageLevel},
@@ -307,6 +354,7 @@ Pnic LoadPnic(const In& in) {
     }
     nic.adminUp = in.Bool("adminUp", true);
     nic.linkUp = in.Bool("linkUp", true);
+    nic.carrier = in.Bool("carrier", nic.linkUp);
     nic.speed = in.Int<std::uint32_t>("speed", 0);
     nic.duplex = in.Int<std::uint32_t>("duplex", 1);
     nic.mtu = in.Int<std::uint32_t>("mtu", 1500);
@@ -352,6 +400,7 @@ Pnic LoadPnic(const In& in) {
     }
     if (auto netqueue = in.OptMember("netqueue")) nic.netqueue = LoadNetqueue(*netqueue);
     if (auto sriov = in.OptMember("sriov")) nic.sriov = LoadSriov(*sriov);
+    nic.unsupported = in.Strings("unsupported");
     in.Done();
     return nic;
 }
@@ -368,6 +417,7 @@ Node SavePnic(const Pnic& nic) {
                       {"firmwareVersion", nic.driver.firmwareVersion},
                       {"busInfo", nic.driver.busInfo}};
     node["adminUp"] = nic.adminUp;
+    node["carrier"] = nic.carrier;
     node["linkUp"] = nic.linkUp;
     node["speed"] = nic.speed;
     node["duplex"] = nic.duplex;
@@ -396,6 +446,7 @@ Node SavePnic(const Pnic& nic) {
                         {"offline", SaveSelfTestResult(nic.selfTest.offline)}};
     node["netqueue"] = SaveNetqueue(nic.netqueue);
     node["sriov"] = SaveSriov(nic.sriov);
+    if (!nic.unsupported.empty()) node["unsupported"] = nic.unsupported;
     return node;
 }
 
@@ -417,6 +468,24 @@ void Check(const PnicsSection& section, Lib::Checker& checker) {
         RequireName(nic.name, checker, "NIC name");
         std::string where = "NIC " + Lib::Quote(nic.name) + ": ";
         if (nic.pci && nic.pci->address.empty()) checker.Fail(where + "empty PCI address");
+        for (const auto& feature : nic.unsupported) {
+            if (std::find_if(std::begin(kPnicFeatureNames), std::end(kPnicFeatureNames),
+                             [&](const char* name) { return feature == name; }) ==
+                std::end(kPnicFeatureNames)) {
+                checker.Fail(where + "unknown feature " + Lib::Quote(feature) + " in \"unsupported\"");
+            }
+        }
+        if (nic.linkUp && !(nic.adminUp && nic.carrier))
+            checker.Fail(where + "link up while the adapter is down or has no carrier");
+        for (auto code : nic.settings.supportedWakeOn) {
+            if (code > 6)
+                checker.Fail(where + "Wake-on mode " + std::to_string(code) + " cannot be supported");
+        }
+        const auto& ring = nic.ring;
+        if (ring.current.rx > ring.preset.rx || ring.current.rxMini > ring.preset.rxMini ||
+            ring.current.rxJumbo > ring.preset.rxJumbo || ring.current.tx > ring.preset.tx) {
+            checker.Fail(where + "a current ring size exceeds its preset maximum");
+        }
         RequireUnique(
             nic.sriov.vfs, [](const VirtualFunction& vf) { return std::to_string(vf.id); }, checker, "VF ID");
         RequireUnique(

@@ -40,6 +40,9 @@ struct LinkMode {
 struct PnicSettings {
     std::vector<std::uint32_t> supportedPorts;
     bool supportsAutoNegotiation = true;
+    // The speeds and duplexes the adapter can run at (absent in the document: the
+    // advertised modes).
+    std::vector<LinkMode> supportedModes;
     std::vector<LinkMode> advertisedModes;
     bool advertisedAutoNegotiation = true;
     std::uint32_t port = 0;
@@ -47,6 +50,9 @@ struct PnicSettings {
     std::uint32_t transceiver = 0;
     bool autoNegotiation = true;
     bool supportsWakeOn = false;
+    // The Wake-on modes the adapter offers (absent in the document: 0 to 6 when it
+    // supports Wake-on at all).
+    std::vector<std::uint32_t> supportedWakeOn;
     std::vector<std::uint32_t> wakeOn;
     bool supportsMessageLevel = true;
     std::uint32_t messageLevel = 0;
@@ -239,15 +245,22 @@ struct Sriov {
     std::vector<VirtualFunction> vfs;
 };
 
+// Driver features an adapter may lack; an operation on a feature the adapter lacks fails.
+constexpr std::size_t kPnicFeatureCount = 8;
+inline const char* const kPnicFeatureNames[kPnicFeatureCount] = {
+    "coalesce", "offload", "ring", "software", "registers", "eeprom", "selfTest", "netqueue"};
+
 struct Pnic {
     std::string name;              // "vmnic0"
     std::optional<PciDevice> pci;  // absent: a pseudo adapter
     std::string description;       // pseudo adapters: "USB-NIC:<vendor>:<device>" for USB
     DriverInfo driver;
     bool adminUp = true;
-    bool linkUp = true;        // carrier detected
-    std::uint32_t speed = 0;   // Mbps, as negotiated or set
-    std::uint32_t duplex = 1;  // 1 full, 2 half
+    bool carrier = true;                   // a link partner is there (absent in the document: linkUp)
+    bool linkUp = true;                    // link detected: up and with a carrier
+    std::uint32_t speed = 0;               // Mbps the link runs at when it is up, as negotiated or forced
+    std::uint32_t duplex = 1;              // 1 full, 2 half, likewise
+    std::vector<std::string> unsupported;  // features of kPnicFeatureNames the driver lacks
     std::uint32_t mtu = 1500;
     HostCtl::Network::MacAddress mac;
     PnicSettings settings;
@@ -273,5 +286,17 @@ struct PnicsSection {
     const Pnic* Find(const std::string& name) const;
     Pnic* Find(const std::string& name);
 };
+
+// True when the adapter's driver offers a feature of kPnicFeatureNames.
+bool Supports(const Pnic& nic, const char* feature);
+
+// The adapter of that name in the current session, for reading or for changing; both throw
+// HostCtlException when the host has no such adapter.
+const Pnic& ReadPnic(const std::string& name);
+Pnic& WritePnic(const std::string& name);
+
+// Sets what pause auto-negotiation agreed on after a change of link, link negotiation or
+// pause settings: nothing without link or negotiation, else the adapter's own choice.
+void ResolvePause(Pnic& nic);
 
 }  // namespace TknCtl::Model

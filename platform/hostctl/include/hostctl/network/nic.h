@@ -105,7 +105,9 @@ struct PnicDriverInfo {
 class PciDevice {
 public:
     PciDevice(std::string address, std::string vendorName, std::string deviceName)
-        : address_(std::move(address)), vendorName_(std::move(vendorName)), deviceName_(std::move(deviceName)) {}
+        : address_(std::move(address)),
+          vendorName_(std::move(vendorName)),
+          deviceName_(std::move(deviceName)) {}
 
     // "0000:04:00.0".
     const std::string& GetAddressString() const { return address_; }

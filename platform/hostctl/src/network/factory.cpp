@@ -58,8 +58,11 @@ NetworkInfoImpl::~NetworkInfoImpl() = default;
 std::uint32_t NetworkInfoImpl::GetNetstackInstanceState(const std::string& key) {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetNetstackInstanceState", key);
     const auto* netstack = Lib::Read<Model::NetstacksSection>().Find(key);
-    if (!netstack) throw HostCtl::Lib::HostCtlException("Netstack instance '" + key + "' does not exist");
-    return netstack->state;
+    if (netstack) return netstack->state;
+    // The dedicated netstacks are known to the host before their first interface creates them.
+    if (key == "glidex" || key == "faultTolerance" || key == "PellixProvisioning")
+        return Model::kNetstackConfigured;
+    throw HostCtl::Lib::HostCtlException("Netstack instance '" + key + "' does not exist");
 }
 
 }  // namespace TknCtl::Network

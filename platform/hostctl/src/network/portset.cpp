@@ -229,9 +229,8 @@ std::uint32_t DVPortImpl::GetConnectionId() const {
 }
 
 void DVPortImpl::SetConnectionId(std::uint32_t connectionId) {
-    Lib::Enter("TknCtl::Network::DVPortImpl::SetConnectionId", param_.GetPortId(),
-               std::to_string(connectionId));
-    EnterDvPort("SetConnectionId", param_);  // the port must exist before anything changes
+    // The port must exist before anything changes.
+    EnterDvPort("SetConnectionId", param_, std::to_string(connectionId));
     for (auto& dvs : Lib::Write<Model::DvSwitchesSection>().switches) {
         if (dvs.uuid != param_.GetSwitchUuid()) continue;
         dvs.FindPort(param_.GetPortId())->connectionId = connectionId;

@@ -1,13 +1,242 @@
-// Tarkon network interfaces.
+// Tarkon network interfaces: tags, the information object, creation and removal.
+#include <algorithm>
+#include <functional>
+
 #include "core/hook.h"
+#include "core/section.h"
+#include "core/text.h"
 #include "hostctl/exception.h"
 #include "hostctl/network/network_info.h"
+#include "hostctl/network/tknnic.h"
+#include "model/netstacks.h"
+#include "model/ports.h"
+#include "network/tknnic_internal.h"
+
+namespace HostCtl::Network {
+
+TknNic::~TknNic() = default;
+TarkonNicInfo::~TarkonNicInfo() = default;
+
+}  // namespace HostCtl::Network
 
 namespace TknCtl::Network {
 
+using HostCtl::Lib::HostCtlException;
+using HostCtl::Network::TknNic;
+
+HostCtl::Network::TknNicTagType TknNicTagNameToId(const std::string& name) {
+    return Model::TagId(name);
+}
+
+std::string TknNicTagIdToName(HostCtl::Network::TknNicTagType type) {
+    const char* name = Model::TagName(type);
+    return name ? name : "";
+}
+
 std::unique_ptr<HostCtl::Network::TarkonNicInfo> NetworkInfoImpl::GetTarkonNicInfo() {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetTarkonNicInfo");
-    throw HostCtl::Lib::HostCtlException("Tarkon interfaces are not available");
+    return std::make_unique<TarkonNicInfoImpl>();
+}
+
+namespace {
+
+// The dedicated netstacks, created when their first interface is.
+const char* const kDedicatedNetstacks[] = {"glidex", "faultTolerance", "PellixProvisioning"};
+
+bool IsDedicatedNetstack(const std::string& key) {
+    return std::find(std::begin(kDedicatedNetstacks), std::end(kDedicatedNetstacks), key) !=
+           std::end(kDedicatedNetstacks);
+}
+
+const Model::Netstack& RequireNetstack(const std::string& key) {
+    const auto* netstack = Lib::Read<Model::NetstacksSection>().Find(key);
+    if (!netstack) throw HostCtlException("Netstack instance " + Lib::Quote(key) + " does not exist");
+    return *netstack;
+}
+
+std::vector<std::unique_ptr<TknNic>> Collect(const std::function<bool(const Model::TknNic&)>& wanted) {
+    std::vector<std::unique_ptr<TknNic>> out;
+    for (const auto& nic : Lib::Read<Model::TknNicsSection>().nics) {
+        if (wanted(nic)) out.push_back(std::make_unique<TknNicImpl>(nic.name));
+    }
+    return out;
+}
+
+// The lowest "tknN" no interface has.
+std::string FreeName() {
+    const auto& section = Lib::Read<Model::TknNicsSection>();
+    for (int n = 0; n <= 255; ++n) {
+        std::string name = "tkn" + std::to_string(n);
+        if (!section.Find(name)) return name;
+    }
+    throw HostCtlException("No free Tarkon network interface name: tkn0 to tkn255 are all in use");
+}
+
+// Whether any interface or port uses the MAC address.
+bool MacInUse(const HostCtl::Network::MacAddress& mac) {
+    const auto& nics = Lib::Read<Model::TknNicsSection>().nics;
+    if (std::any_of(nics.begin(), nics.end(), [&](const Model::TknNic& n) { return n.mac == mac; }))
+        return true;
+    const auto& ports = Lib::Read<Model::PortsSection>().ports;
+    return std::any_of(ports.begin(), ports.end(), [&](const Model::Port& p) { return p.mac == mac; });
+}
+
+// A unique locally administered address: 02:48:44:00:xx:yy, the lowest free from :00:10 on.
+HostCtl::Network::MacAddress FreeMac() {
+    for (std::uint32_t n = 0x10; n <= 0xffff; ++n) {
+        HostCtl::Network::MacAddress mac(HostCtl::Network::MacAddress::Bytes{
+            0x02, 0x48, 0x44, 0x00, static_cast<std::uint8_t>(n >> 8), static_cast<std::uint8_t>(n & 0xff)});
+        if (!MacInUse(mac)) return mac;
+    }
+    throw HostCtlException("No free MAC address for a Tarkon network interface");
+}
+
+}  // namespace
+
+TarkonNicInfoImpl::TarkonNicInfoImpl() = default;
+TarkonNicInfoImpl::~TarkonNicInfoImpl() = default;
+
+std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNics() {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNics");
+    return Collect([](const Model::TknNic&) { return true; });
+}
+
+std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNicsByInstanceKey(
+    const std::string& netstack) {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicsByInstanceKey", netstack);
+    RequireNetstack(netstack);
+    return Collect([&](const Model::TknNic& nic) { return nic.netstack == netstack; });
+}
+
+std::unique_ptr<TknNic> TarkonNicInfoImpl::GetTarkonNicByInterface(const std::string& name, bool mustExist) {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicByInterface", name, Lib::Args(mustExist));
+    if (!Lib::Read<Model::TknNicsSection>().Find(name)) {
+        if (mustExist) Internal::FindTknNic(name);  // throws
+        return nullptr;
+    }
+    return std::make_unique<TknNicImpl>(name);
+}
+
+std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNicsByTag(
+    HostCtl::Network::TknNicTagType tag) {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicsByTag", {}, Lib::Args(tag));
+    return Collect([&](const Model::TknNic& nic) {
+        return std::find(nic.tags.begin(), nic.tags.end(), tag) != nic.tags.end();
+    });
+}
+
+void TarkonNicInfoImpl::GetTarkonNicNamesByInstanceKey(std::vector<std::string>& names,
+                                                       const std::string& netstack) {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicNamesByInstanceKey", netstack);
+    RequireNetstack(netstack);
+    for (const auto& nic : Lib::Read<Model::TknNicsSection>().nics) {
+        if (nic.netstack == netstack) names.push_back(nic.name);
+    }
+}
+
+std::unique_ptr<TknNic> TarkonNicInfoImpl::AddTarkonNic(HostCtl::Network::ConnectionPoint* connectionPoint,
+                                                        const std::string& netstack,
+                                                        const HostCtl::Network::IpConfig& config,
+                                                        const HostCtl::Network::MacAddress& mac,
+                                                        unsigned tsoMss, unsigned mtu, unsigned rxQueues,
+                                                        const std::string& name) {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::AddTarkonNic", netstack,
+               Lib::Args(name, mac.IsZero() ? std::string() : mac.GetStringAddress(), tsoMss, mtu, rxQueues));
+    if (!connectionPoint) throw HostCtlException("A Tarkon network interface needs a connection point");
+
+    // Everything is checked before anything changes.
+    Model::TknNic nic;
+    nic.connection = Internal::ToModelConnection(*connectionPoint);
+    Internal::CheckAttachable(nic.connection);
+
+    if (name.empty()) {
+        nic.name = FreeName();
+    } else {
+        if (!Model::IsTknNicName(name)) {
+            throw HostCtlException("Invalid Tarkon network interface name " + Lib::Quote(name) +
+                                   ": it must be tkn followed by a number from 0 to 255");
+        }
+        if (Lib::Read<Model::TknNicsSection>().Find(name)) {
+            throw HostCtlException("A Tarkon network interface named " + name + " already exists");
+        }
+        nic.name = name;
+    }
+
+    const auto* stack = Lib::Read<Model::NetstacksSection>().Find(netstack);
+    if (!stack && !IsDedicatedNetstack(netstack)) {
+        throw HostCtlException("Netstack instance " + Lib::Quote(netstack) + " does not exist");
+    }
+    nic.netstack = netstack;
+
+    if (mac.IsZero()) {
+        nic.mac = FreeMac();
+    } else {
+        if (!mac.IsUnicast()) {
+            throw HostCtlException("MAC address " + mac.GetStringAddress() +
+                                   " is a group address; an interface needs a unicast address");
+        }
+        if (MacInUse(mac))
+            throw HostCtlException("MAC address " + mac.GetStringAddress() + " is already in use");
+        nic.mac = mac;
+    }
+
+    if (mtu != 0 &&
+        (mtu < static_cast<unsigned>(TknNic::MIN_MTU) || mtu > static_cast<unsigned>(TknNic::MAX_MTU))) {
+        throw HostCtlException("Invalid MTU " + std::to_string(mtu) + ": it must be between " +
+                               std::to_string(TknNic::MIN_MTU) + " and " + std::to_string(TknNic::MAX_MTU));
+    }
+    nic.mtu = mtu != 0 ? mtu : TknNic::DEFAULT_MTU;
+    if (rxQueues > TknNic::MAX_RX_DISP_QUEUES) {
+        throw HostCtlException("Invalid number of RX dispatch queues " + std::to_string(rxQueues) +
+                               ": it must be between 1 and " + std::to_string(TknNic::MAX_RX_DISP_QUEUES));
+    }
+    nic.rxDispQueues = rxQueues != 0 ? rxQueues : TknNic::DEFAULT_RX_DISP_QUEUES;
+    if (tsoMss > TknNic::DEFAULT_TSO_MSS) {
+        throw HostCtlException("Invalid TSO MSS " + std::to_string(tsoMss) + ": it must be at most " +
+                               std::to_string(TknNic::DEFAULT_TSO_MSS));
+    }
+    nic.tsoMss = tsoMss != 0 ? tsoMss : TknNic::DEFAULT_TSO_MSS;
+    nic.enabled = true;
+    nic.ipConfig = Internal::CheckedIpConfig(nic, nullptr, config);
+
+    // The netstack: a dedicated one is created, one that is only configured is enabled.
+    if (!stack) {
+        Model::Netstack created;
+        created.key = netstack;
+        created.name = netstack;
+        Lib::Write<Model::NetstacksSection>().netstacks.push_back(created);
+    } else if (stack->state != Model::kNetstackEnabled) {
+        auto* enabled = Lib::Write<Model::NetstacksSection>().Find(netstack);
+        enabled->state = Model::kNetstackEnabled;
+        enabled->currentMaxConnections = enabled->maxConnections;
+        enabled->currentIpv6Enabled = enabled->ipv6Enabled;
+    }
+
+    std::string created = nic.name;
+    Lib::Write<Model::TknNicsSection>().nics.push_back(std::move(nic));
+    auto& stored = Internal::FindTknNicForWrite(created);
+    stored.portId = Internal::Attach(stored);
+    Internal::SyncTknNic(created);
+    return std::make_unique<TknNicImpl>(created);
+}
+
+void TarkonNicInfoImpl::RemoveTarkonNic(HostCtl::Network::ConnectionPoint* connectionPoint,
+                                        const std::string& netstack) {
+    Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::RemoveTarkonNic", netstack);
+    if (!connectionPoint) throw HostCtlException("No connection point given");
+    Model::ConnectionPoint point = Internal::ToModelConnection(*connectionPoint);
+    for (const auto& nic : Lib::Read<Model::TknNicsSection>().nics) {
+        if (!Internal::SameConnection(nic.connection, point)) continue;
+        if (nic.netstack != netstack) {
+            throw HostCtlException("The Tarkon network interface at " + Internal::DescribeConnection(point) +
+                                   " (" + nic.name + ") belongs to netstack " + Lib::Quote(nic.netstack) +
+                                   ", not " + Lib::Quote(netstack));
+        }
+        Internal::RemoveTknNic(nic.name);  // nic is gone after this
+        return;
+    }
+    throw HostCtlException("No Tarkon network interface is attached to " +
+                           Internal::DescribeConnection(point));
 }
 
 }  // namespace TknCtl::Network

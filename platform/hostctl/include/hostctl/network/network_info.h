@@ -44,7 +44,8 @@ public:
     // The NIC of that name, or nothing.
     virtual std::unique_ptr<Pnic> GetPnicByName(const std::string& name) = 0;
     // NETSTACK_STATE_ENABLED for an enabled netstack instance; 0 for one that exists only in
-    // the configuration; throws for an unknown key.
+    // the configuration, and for a dedicated netstack ("glidex", "faultTolerance",
+    // "PellixProvisioning") not created yet; throws for any other unknown key.
     virtual std::uint32_t GetNetstackInstanceState(const std::string& key) = 0;
     virtual std::unique_ptr<TarkonNicInfo> GetTarkonNicInfo() = 0;
 

@@ -370,10 +370,24 @@ private:
 
 // The host's port group of that name, wherever it is. Every operation reads the host anew and
 // throws HostCtlException once the port group is gone.
-class PortGroupImpl : public HostCtl::Network::PortGroup, public TknCtl::Lib::TknCtlObject {
+//
+// A port group is also the connection point of a Tarkon interface (tknnic.h): as such its
+// IsValid() says whether the port group exists and GetPortsetName() names its switch (empty
+// when it does not exist); these operations never throw for a missing port group.
+class PortGroupImpl : public HostCtl::Network::PortGroup,
+                      public HostCtl::Network::ConnectionPoint,
+                      public TknCtl::Lib::TknCtlObject {
 public:
     explicit PortGroupImpl(std::string name);
     ~PortGroupImpl() override;
+
+    // As a connection point (tknnic_connection.cpp).
+    std::string GetPortsetName() const override;
+    bool IsValid() const override;
+    int GetConnectionType() const override;
+    std::string GetPortGroupName() const override;
+    HostCtl::Network::DVPortParam GetDVPortParam() const override;
+    HostCtl::Network::OpaqueNetworkParam GetOpaqueNetworkParam() const override;
 
     std::string GetName() const override;
     std::string GetVirtualSwitchName() const override;

@@ -1,0 +1,182 @@
+// A Tarkon interface.
+#include <algorithm>
+
+#include "core/hook.h"
+#include "core/section.h"
+#include "core/text.h"
+#include "hostctl/exception.h"
+#include "hostctl/network/dvs.h"
+#include "model/multicast.h"
+#include "network/tknnic_internal.h"
+
+namespace TknCtl::Network {
+
+using HostCtl::Lib::HostCtlException;
+using HostCtl::Network::TknNicTagType;
+
+namespace {
+
+void RequireTagType(TknNicTagType tag) {
+    if (!Model::TagName(tag)) {
+        throw HostCtlException("Invalid interface tag type " + std::to_string(tag) + ": it must be between " +
+                               std::to_string(HostCtl::Network::TKNNIC_TAG_FIRST) + " and " +
+                               std::to_string(HostCtl::Network::TKNNIC_TAG_LAST));
+    }
+}
+
+// A tag as the journal shows it: its name, or its number when it has none.
+std::string TagArg(TknNicTagType tag) {
+    std::string name = TknNicTagIdToName(tag);
+    return name.empty() ? std::to_string(tag) : name;
+}
+
+}  // namespace
+
+namespace Internal {
+
+const Model::TknNic& FindTknNic(const std::string& name) {
+    const auto* nic = Lib::Read<Model::TknNicsSection>().Find(name);
+    if (!nic) throw HostCtlException("Tarkon network interface " + Lib::Quote(name) + " does not exist");
+    return *nic;
+}
+
+Model::TknNic& FindTknNicForWrite(const std::string& name) {
+    FindTknNic(name);
+    return *Lib::Write<Model::TknNicsSection>().Find(name);
+}
+
+}  // namespace Internal
+
+TknNicImpl::TknNicImpl(std::string name) : name_(std::move(name)) {}
+TknNicImpl::~TknNicImpl() = default;
+
+const Model::TknNic& TknNicImpl::Enter(const char* operation, const std::string& arguments) const {
+    Lib::Enter(std::string("HostCtl::Network::TknNic::") + operation, name_, arguments);
+    return Internal::FindTknNic(name_);
+}
+
+std::string TknNicImpl::GetName() const {
+    return Enter("GetName").name;
+}
+std::string TknNicImpl::GetNetstackInstance() const {
+    return Enter("GetNetstackInstance").netstack;
+}
+HostCtl::Network::MacAddress TknNicImpl::GetMacAddress() const {
+    return Enter("GetMacAddress").mac;
+}
+int TknNicImpl::GetMtu() const {
+    return static_cast<int>(Enter("GetMtu").mtu);
+}
+int TknNicImpl::GetTsoMss() const {
+    return static_cast<int>(Enter("GetTsoMss").tsoMss);
+}
+int TknNicImpl::GetRxDispQueueSize() const {
+    return static_cast<int>(Enter("GetRxDispQueueSize").rxDispQueues);
+}
+bool TknNicImpl::IsEnabled() const {
+    return Enter("IsEnabled").enabled;
+}
+
+void TknNicImpl::SetMtu(int mtu) {
+    Enter("SetMtu", std::to_string(mtu));
+    if (mtu < MIN_MTU || mtu > MAX_MTU) {
+        throw HostCtlException("Invalid MTU " + std::to_string(mtu) + ": it must be between " +
+                               std::to_string(MIN_MTU) + " and " + std::to_string(MAX_MTU));
+    }
+    Internal::FindTknNicForWrite(name_).mtu = static_cast<std::uint32_t>(mtu);
+}
+
+void TknNicImpl::Enable() {
+    if (!Enter("Enable").enabled) Internal::FindTknNicForWrite(name_).enabled = true;
+}
+
+void TknNicImpl::Disable() {
+    if (Enter("Disable").enabled) Internal::FindTknNicForWrite(name_).enabled = false;
+}
+
+HostCtl::Network::IpConfig TknNicImpl::GetIpConfig() const {
+    return Enter("GetIpConfig").ipConfig;
+}
+
+HostCtl::Network::IpConfig TknNicImpl::GetDnsIpConfig() const {
+    HostCtl::Network::IpConfig config = Enter("GetDnsIpConfig").ipConfig;
+    if (!config.GetUseDhcp()) config.SetDhcpDns(false);
+    if (!config.GetUseIpv6Dhcp() && !config.GetUseIpv6RouterAdvertised()) config.SetIpv6DhcpDns(false);
+    return config;
+}
+
+void TknNicImpl::SetIpConfig(const HostCtl::Network::IpConfig& config) {
+    const auto& nic = Enter("SetIpConfig");
+    HostCtl::Network::IpConfig checked = Internal::CheckedIpConfig(nic, &nic.ipConfig, config);
+    if (checked == nic.ipConfig) return;
+    Internal::FindTknNicForWrite(name_).ipConfig = std::move(checked);
+    Internal::SyncTknNic(name_);
+}
+
+std::unique_ptr<HostCtl::Network::ConnectionPoint> TknNicImpl::GetConnectionPoint() const {
+    return Internal::MakeConnectionPoint(Enter("GetConnectionPoint").connection);
+}
+
+std::unique_ptr<HostCtl::Network::Port> TknNicImpl::GetPort() const {
+    const auto& nic = Enter("GetPort");
+    if (!nic.portId) return nullptr;
+    return std::make_unique<PortImpl>(*nic.portId);
+}
+
+void TknNicImpl::AddTag(TknNicTagType tag, bool exclusive) {
+    const auto& nic = Enter("AddTag", Lib::Args(TagArg(tag), exclusive));
+    RequireTagType(tag);
+    bool carries = std::find(nic.tags.begin(), nic.tags.end(), tag) != nic.tags.end();
+    bool elsewhere = false;
+    if (exclusive) {
+        for (const auto& other : Lib::Read<Model::TknNicsSection>().nics) {
+            if (other.name != name_ &&
+                std::find(other.tags.begin(), other.tags.end(), tag) != other.tags.end())
+                elsewhere = true;
+        }
+    }
+    if (carries && !elsewhere) return;
+    for (auto& other : Lib::Write<Model::TknNicsSection>().nics) {
+        if (other.name == name_) {
+            if (!carries) other.tags.push_back(tag);
+        } else if (exclusive) {
+            other.tags.erase(std::remove(other.tags.begin(), other.tags.end(), tag), other.tags.end());
+        }
+    }
+}
+
+void TknNicImpl::RemoveTag(TknNicTagType tag) {
+    const auto& nic = Enter("RemoveTag", TagArg(tag));
+    RequireTagType(tag);
+    if (std::find(nic.tags.begin(), nic.tags.end(), tag) == nic.tags.end()) {
+        throw HostCtlException("Tarkon network interface " + name_ + " does not carry the tag " +
+                               TknNicTagIdToName(tag));
+    }
+    auto& tags = Internal::FindTknNicForWrite(name_).tags;
+    tags.erase(std::remove(tags.begin(), tags.end(), tag), tags.end());
+}
+
+void TknNicImpl::GetTags(std::vector<TknNicTagType>& tags) const {
+    const auto& nic = Enter("GetTags");
+    tags.insert(tags.end(), nic.tags.begin(), nic.tags.end());
+}
+
+void TknNicImpl::GetMulticastGroups(std::vector<MulticastGroup>& groups) const {
+    Enter("GetMulticastGroups");
+    for (const auto& m : Lib::Read<Model::MulticastSection>().memberships) {
+        if (m.interface == name_) groups.push_back({m.interface, m.group, m.linkLayer, m.refCount});
+    }
+}
+
+void TknNicImpl::Remove() {
+    Enter("Remove");
+    Internal::RemoveTknNic(name_);
+}
+
+void TknNicImpl::Refresh() {
+    Enter("Refresh");
+    Internal::SyncTknNic(name_);
+    SetStale(false);
+}
+
+}  // namespace TknCtl::Network

@@ -32,29 +32,33 @@ void VirtualSwitchPortGroupPolicyShapingSet::ExecuteInternal(InputPtr input, Out
         const bool reset = input->IsFlagSet("use-vswitch");
         auto own = group->GetOwnShapingPolicy();
         if (reset) own.UnsetAll();
-        SetShapingPolicy(input, output, own, false);
+        // What the port group has in force once its overrides are dropped or kept.
+        const auto effective =
+            reset ? group->GetVirtualSwitch()->GetShapingPolicy() : group->GetShapingPolicy();
+        if (!own.IsEnabledSet() && effective.IsEnabled() && !input->HasParameter("enabled")) {
+            // Shaping is on through the switch: the values given override the switch's, while
+            // "enabled" keeps following it.
+            auto edited = own;
+            edited.SetEnabled(true);
+            SetShapingPolicy(input, output, edited, false);
+            own = HostCtl::Network::ShapingPolicy();
+            if (edited.IsAverageBpsSet()) own.SetAverageBps(edited.GetAverageBps());
+            if (edited.IsPeakBpsSet()) own.SetPeakBps(edited.GetPeakBps());
+            if (edited.IsBurstSizeSet()) own.SetBurstSize(edited.GetBurstSize());
+        } else {
+            SetShapingPolicy(input, output, own, false);
+        }
         if (own.IsEnabledSet() && own.IsEnabled()) {
             // An enabled policy needs its three values, from the port group or from the switch.
-            auto effective =
-                reset ? group->GetVirtualSwitch()->GetShapingPolicy() : group->GetShapingPolicy();
-            if (!own.IsPeakBpsSet() && !effective.IsPeakBpsSet()) {
-                output->AddErrorMessage(
-                    "Unable to set shaping policy. A Peak BPS value must be set on either this port group or "
-                    "on the "
-                    "parent virtual switch.");
-            }
-            if (!own.IsAverageBpsSet() && !effective.IsAverageBpsSet()) {
-                output->AddErrorMessage(
-                    "Unable to set shaping policy. An Average BPS value must be set on either this port "
-                    "group or on "
-                    "the parent virtual switch.");
-            }
-            if (!own.IsBurstSizeSet() && !effective.IsBurstSizeSet()) {
-                output->AddErrorMessage(
-                    "Unable to set shaping policy. A Burst Size value must be set on either this port group "
-                    "or on "
-                    "the parent virtual switch.");
-            }
+            const std::string prefix = "Unable to set shaping policy. ";
+            const std::string where =
+                " must be set on either this port group or on the parent virtual switch.";
+            if (!own.IsPeakBpsSet() && !effective.IsPeakBpsSet())
+                output->AddErrorMessage(prefix + "A Peak BPS value" + where);
+            if (!own.IsAverageBpsSet() && !effective.IsAverageBpsSet())
+                output->AddErrorMessage(prefix + "An Average BPS value" + where);
+            if (!own.IsBurstSizeSet() && !effective.IsBurstSizeSet())
+                output->AddErrorMessage(prefix + "A Burst Size value" + where);
         }
         if (!output->HasError()) group->UpdateShapingPolicy(own);
         Frame::SetResult(output, true);

@@ -147,10 +147,8 @@ void Check(const VSwitchesSection& section, Lib::Checker& checker) {
         if (s.mtu < kMinMtu || s.mtu > kMaxMtu)
             checker.Fail(where + "MTU " + std::to_string(s.mtu) + " (1280 to 9000)");
         hostPorts += s.numPorts;
-        CheckTeaming(s.policy.teaming, s, where, checker);
         for (const auto& g : s.portGroups) {
             RequireName(g.name, checker, "port group name");
-            CheckTeaming(g.policy.teaming, s, where + "port group " + Lib::Quote(g.name) + ": ", checker);
             if (g.vlanId > kMaxVlanId) {
                 checker.Fail(where + "port group " + Lib::Quote(g.name) + " has VLAN ID " +
                              std::to_string(g.vlanId) + " (at most 4095)");
@@ -174,6 +172,13 @@ void Check(const VSwitchesSection& section, Lib::Checker& checker) {
         groups, [](const std::string& g) { return g; }, checker, "port group name");
     RequireUnique(
         uplinks, [](const std::string& u) { return u; }, checker, "uplink (a NIC on two switches)");
+    // Teaming orders name uplinks of their own switch.
+    for (const auto& s : section.switches) {
+        std::string where = "switch " + Lib::Quote(s.name) + ": ";
+        CheckTeaming(s.policy.teaming, s, where, checker);
+        for (const auto& g : s.portGroups)
+            CheckTeaming(g.policy.teaming, s, where + "port group " + Lib::Quote(g.name) + ": ", checker);
+    }
 }
 
 }  // namespace

@@ -196,9 +196,9 @@ std::vector<std::string> VirtualSwitchImpl::GetBeaconRequiredBy() const {
 void VirtualSwitchImpl::SetMtu(int mtu) {
     EnterSwitch("SetMtu", name_, Lib::Args(mtu));
     if (mtu < static_cast<int>(Model::kMinMtu) || mtu > static_cast<int>(Model::kMaxMtu)) {
-        throw HostCtlException("Unable to set the MTU of virtual switch " + name_ + " to " +
-                               std::to_string(mtu) + ": the MTU must be between " +
-                               std::to_string(Model::kMinMtu) + " and " + std::to_string(Model::kMaxMtu));
+        throw HostCtlException("Unable to set the MTU of virtual switch " + name_ +
+                               ": the MTU must be between " + std::to_string(Model::kMinMtu) + " and " +
+                               std::to_string(Model::kMaxMtu));
     }
     auto& vswitch = WritableSwitch(name_);
     vswitch.mtu = static_cast<std::uint32_t>(mtu);

@@ -333,3 +333,54 @@ TEST_F(PolicyTest, PortGroupShapingNeedsValuesOnThePortGroupOrTheSwitch) {
 
 }  // namespace
 }  // namespace Hadro::Test
+
+namespace Hadro::Test {
+namespace {
+
+// The shared policy parameters as the help shows them.
+TEST_F(PolicyTest, HelpShowsTheSharedPolicyParameters) {
+    auto help = [this](const std::string& path) {
+        auto r = Run("--formatter=json network vswitch standard " + path + " --help");
+        EXPECT_EQ(r.status, 0) << r.err;
+        return json::parse(r.out);
+    };
+    auto failover = help("portgroup policy failover set");
+    EXPECT_EQ(failover["metadata"]["type"], "operation");
+    ASSERT_EQ(failover["parameters"].size(), 8u);
+    EXPECT_EQ(
+        failover["parameters"][1]["description"],
+        "Reset all values for this policy to use parent virtual switch's settings instead of overriding the "
+        "settings for the port group. Using this in conjunction with other settings will first reset all of "
+        "the fields to use the virtual switch setting and then apply the other options after the reset.");
+    EXPECT_EQ(
+        failover["parameters"][6]["description"],
+        "Configure the list of active adapters and their failover order. This list must be a comma seperated "
+        "list of values with the uplink name and no spaces. Example:  "
+        "--active-uplinks=vmnic0,vmnic3,vmnic7,vmnic1");
+    EXPECT_EQ(failover["parameters"][2]["constraint"]["values"][3]["value"], "explicit");
+
+    auto security = help("portgroup policy security set");
+    EXPECT_NE(security["parameters"][1]["description"].get<std::string>().find("port group.   Using"),
+              std::string::npos);
+    EXPECT_EQ(security["parameters"][2]["short"], "o");
+    EXPECT_EQ(help("policy security set")["parameters"][1]["short"], "p");
+
+    auto shaping = help("policy shaping set");
+    EXPECT_EQ(shaping["metadata"]["type"], "operator");
+    EXPECT_EQ(shaping["parameters"][2]["constraint"],
+              json::parse(R"({"kind":"range","min":1,"max":9223372036854775807})"));
+    EXPECT_EQ(shaping["parameters"][1]["description"],
+              "Indicate whether to enable traffic shaping on this policy. If this is true then the "
+              "--avg-bandwidth, "
+              "--peak-bandwidth and --burst-size options are required.");
+
+    auto get = help("portgroup policy shaping get");
+    EXPECT_EQ(get["formatter"], "simple");
+    EXPECT_EQ(get["output-parameters"][0], json::parse(R"({"key":"header:PortGroupTrafficShapingPolicy",
+        "value":"<NONE>"})"));
+    EXPECT_EQ(get["output-parameters"][4],
+              json::parse(R"({"key":"units:PortGroupTrafficShapingPolicy.Burst Size","value":"Kib"})"));
+}
+
+}  // namespace
+}  // namespace Hadro::Test

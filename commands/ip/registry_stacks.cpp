@@ -4,7 +4,19 @@
 namespace TalvexCli::NetworkNamespace {
 
 const FactoryList& IpStackFactories() {
-    static const FactoryList factories{};
+    static const FactoryList factories{
+        NETWORK_FACTORY(IpNetstackInstanceAdd),
+        NETWORK_FACTORY(IpNetstackInstanceList),
+        NETWORK_FACTORY(IpNetstackInstanceGet),
+        NETWORK_FACTORY(IpNetstackInstanceSet),
+        NETWORK_FACTORY(IpNetstackInstanceRemove),
+        NETWORK_FACTORY(IpIpsecSAAdd),
+        NETWORK_FACTORY(IpIpsecSAList),
+        NETWORK_FACTORY(IpIpsecSARemove),
+        NETWORK_FACTORY(IpIpsecSPAdd),
+        NETWORK_FACTORY(IpIpsecSPList),
+        NETWORK_FACTORY(IpIpsecSPRemove),
+    };
     return factories;
 }
 

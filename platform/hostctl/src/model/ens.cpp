@@ -43,8 +43,16 @@ Json::Node Save(const EnsSection& section) {
 void Check(const EnsSection& section, Lib::Checker& checker) {
     RequireUnique(
         section.lcores, [](const Lcore& l) { return std::to_string(l.id); }, checker, "ENS context ID");
-    if (section.lcores.size() > section.maxLcores) checker.Fail("more ENS contexts than the maximum");
+    if (section.maxLcores > kMaxLcoresLimit) {
+        checker.Fail("maximum number of ENS contexts " + std::to_string(section.maxLcores) + " above " +
+                     std::to_string(kMaxLcoresLimit));
+    }
+    if (section.numaNodes == 0) checker.Fail("a host has at least one NUMA node");
     for (const auto& l : section.lcores) {
+        if (l.id >= section.maxLcores) {
+            checker.Fail("ENS context ID " + std::to_string(l.id) + " not below the maximum " +
+                         std::to_string(section.maxLcores));
+        }
         if (l.affinity >= section.numaNodes) {
             checker.Fail("ENS context " + std::to_string(l.id) + " bound to NUMA node " +
                          std::to_string(l.affinity) + " of " + std::to_string(section.numaNodes));

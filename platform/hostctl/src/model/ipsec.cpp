@@ -93,6 +93,21 @@ void Check(const IpsecSection& section, Lib::Checker& checker) {
         named, [](const IpsecSa* sa) { return sa->name; }, checker, "SA name");
     RequireUnique(
         section.sps, [](const IpsecSp& sp) { return sp.name; }, checker, "SP name");
+    RequireUnique(
+        section.sas,
+        [](const IpsecSa& sa) {
+            return sa.source.GetStringAddress() + " " + sa.destination.GetStringAddress() + " " +
+                   std::to_string(sa.spi);
+        },
+        checker, "SA source, destination and SPI");
+    // An SP names an SA of its own, none (chosen automatically) or "UNKNOWN" (its SA was removed).
+    for (const auto& sp : section.sps) {
+        if (sp.saName.empty() || sp.saName == "UNKNOWN") continue;
+        bool found = false;
+        for (const auto* sa : named)
+            found = found || sa->name == sp.saName;
+        if (!found) checker.Fail("SP " + Lib::Quote(sp.name) + " names unknown SA " + Lib::Quote(sp.saName));
+    }
 }
 
 }  // namespace

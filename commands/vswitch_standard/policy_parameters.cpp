@@ -37,13 +37,11 @@ void AddFailoverParameters(const InputSpecPtr& spec) {
          "Configure whether a NIC will be used immediately when it comes back in service after a failover"},
         {"active-uplinks", "a", Frame::kString,
          "Configure the list of active adapters and their failover order. This list must be a comma "
-         "seperated list "
-         "of values with the uplink name and no spaces. Example:  "
+         "seperated list of values with the uplink name and no spaces. Example:  "
          "--active-uplinks=vmnic0,vmnic3,vmnic7,vmnic1"},
         {"standby-uplinks", "s", Frame::kString,
          "Configure the list of standby adapters and their failover order. This list must be a comma "
-         "seperated list "
-         "of values with the uplink name and no spaces. Example:  "
+         "seperated list of values with the uplink name and no spaces. Example:  "
          "--standby-uplinks=vmnic2,vmnic4,vmnic8,vmnic6,vmnic11"},
     };
     for (const auto& param : params)
@@ -69,8 +67,7 @@ void AddShapingParameters(const InputSpecPtr& spec) {
     const std::vector<Frame::Param> params = {
         {"enabled", "e", Frame::kBool,
          "Indicate whether to enable traffic shaping on this policy. If this is true then the "
-         "--avg-bandwidth, "
-         "--peak-bandwidth and --burst-size options are required."},
+         "--avg-bandwidth, --peak-bandwidth and --burst-size options are required."},
         {"avg-bandwidth", "b", Frame::kInt,
          "The averge bandwidth allowed for this shaping policy. This value is in Kbps (1 Kbps = 1000 bits/s)",
          Frame::kOptional, positive},

@@ -27,22 +27,19 @@ std::unique_ptr<VirtualSwitch> SwitchById(const std::string& name) {
 namespace {
 
 const char* const kFailoverFields =
-    "Load Balancing,Network Failure Detection,Notify Switches,Failback,Active Adapters,Standby "
-    "Adapters,Unused "
-    "Adapters";
+    "Load Balancing,Network Failure Detection,Notify Switches,Failback,"
+    "Active Adapters,Standby Adapters,Unused Adapters";
 const char* const kFailoverOverrideFields =
-    ",Override Vswitch Load Balancing,Override Vswitch Network Failure Detection,Override Vswitch Notify "
-    "Switches,Override Vswitch Failback,Override Vswitch Uplinks";
+    ",Override Vswitch Load Balancing,Override Vswitch Network Failure Detection,"
+    "Override Vswitch Notify Switches,Override Vswitch Failback,Override Vswitch Uplinks";
 const char* const kSecurityFields = "Allow Promiscuous,Allow MAC Address Change,Allow Forged Transmits";
 const char* const kSecurityOverrideFields =
-    ",Override Vswitch Allow Promiscuous,Override Vswitch Allow MAC Address Change,Override Vswitch Allow "
-    "Forged "
-    "Transmits";
+    ",Override Vswitch Allow Promiscuous,Override Vswitch Allow MAC Address Change,"
+    "Override Vswitch Allow Forged Transmits";
 const char* const kShapingFields = "Enabled,Average Bandwidth,Peak Bandwidth,Burst Size";
 const char* const kShapingOverrideFields =
-    ",Override Vswitch Enabled,Override Vswitch Average Bandwidth,Override Vswitch Peak Bandwidth,Override "
-    "Vswitch "
-    "Burst Size";
+    ",Override Vswitch Enabled,Override Vswitch Average Bandwidth,"
+    "Override Vswitch Peak Bandwidth,Override Vswitch Burst Size";
 
 // The fields of a comma-separated list, as record fields made by make.
 std::vector<Frame::Field> Fields(std::string list, Frame::Field (*make)(std::string)) {
@@ -181,14 +178,13 @@ Frame::Description GetDescription(const char* description, const char* recordNam
 
 Frame::Param UseVswitchParameter(bool securityText) {
     const std::string gap = securityText ? "   " : " ";
-    return {
-        "use-vswitch", "u", Frame::kFlag,
+    const std::string first =
         "Reset all values for this policy to use parent virtual switch's settings instead of overriding the "
-        "settings for the port group." +
-            gap +
-            "Using this in conjunction with other settings will first reset all of the fields to use the "
-            "virtual "
-            "switch setting and then apply the other options after the reset."};
+        "settings for the port group.";
+    const std::string second =
+        "Using this in conjunction with other settings will first reset all of the fields to use the virtual "
+        "switch setting and then apply the other options after the reset.";
+    return {"use-vswitch", "u", Frame::kFlag, first + gap + second};
 }
 
 }  // namespace TalvexCli::NetworkNamespace::VswitchStandard

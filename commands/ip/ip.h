@@ -113,7 +113,8 @@ public:
 namespace IpServices {
 // The address of a DNS server as typed: tried as IPv4 first, then as IPv6. Neither: adds
 // "The specified address '...' is not recognised as a valid IP address" and returns nothing.
-std::unique_ptr<HostCtl::Network::IpAddress> DnsServerAddress(const std::string& text, const OutputPtr& output);
+std::unique_ptr<HostCtl::Network::IpAddress> DnsServerAddress(const std::string& text,
+                                                              const OutputPtr& output);
 }  // namespace IpServices
 
 // ---------------------------------------------------------------- netstack instances and IPsec

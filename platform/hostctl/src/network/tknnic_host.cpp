@@ -13,6 +13,7 @@
 #include "model/ports.h"
 #include "model/routes.h"
 #include "model/vswitches.h"
+#include "network/ip_internal.h"
 #include "network/tknnic_internal.h"
 
 namespace TknCtl::Network::Internal {
@@ -322,6 +323,7 @@ void SyncTknNic(const std::string& name) {
     };
     if (current ? upToDate(current->ipv4, ipv4, same4) && upToDate(current->ipv6, ipv6, same6)
                 : ipv4.empty() && ipv6.empty()) {
+        SyncGatewayRoutes(nic.netstack);
         return;
     }
 
@@ -347,6 +349,7 @@ void SyncTknNic(const std::string& name) {
     };
     update(stack->ipv4, ipv4, same4);
     update(stack->ipv6, ipv6, same6);
+    SyncGatewayRoutes(nic.netstack);
 }
 
 void RemoveTknNic(const std::string& name) {
@@ -391,6 +394,8 @@ void RemoveTknNic(const std::string& name) {
 
     std::erase_if(Lib::Write<Model::TknNicsSection>().nics,
                   [&](const Model::TknNic& n) { return n.name == name; });
+    // A default gateway another interface reaches gets its route back through it.
+    SyncGatewayRoutes(nic.netstack);
 }
 
 }  // namespace TknCtl::Network::Internal

@@ -76,8 +76,8 @@ TEST_F(IpTest, SearchDomainsAreKeptInSearchOrder) {
               List({"example.com", "corp.example.org"}));
 
     auto before = Section("dns");
-    EXPECT_EQ(Run("network ip dns search add -d Example.COM").Errors(),
-              Strings{"Search domain Example.COM is already configured"});
+    EXPECT_EQ(Run("network ip dns search add -d Example.COM.").Errors(),
+              Strings{"Search domain Example.COM. is already configured"});
     EXPECT_EQ(
         Run("network ip dns search add -d 'two words'").Errors(),
         Strings{"Invalid search domain 'two words': it may hold only letters, digits, hyphens and dots"});

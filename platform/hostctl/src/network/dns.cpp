@@ -25,8 +25,10 @@ std::string Canonical(const std::string& text) {
     return text;
 }
 
+// A domain name as compared: lower case, without a final dot.
 std::string Lower(std::string text) {
     std::transform(text.begin(), text.end(), text.begin(), [](unsigned char c) { return std::tolower(c); });
+    if (!text.empty() && text.back() == '.') text.pop_back();
     return text;
 }
 

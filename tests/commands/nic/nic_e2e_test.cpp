@@ -106,4 +106,29 @@ TEST_F(NicEndToEnd, HelpShowsTheDeclaredParameters) {
     EXPECT_EQ(software["parameters"][6]["type"], "boolean");
 }
 
+TEST_F(NicEndToEnd, EepromFromAFileAndVirtualFunctions) {
+    const std::string image = dir_ + "/eeprom.bin";
+    FILE* file = fopen(image.c_str(), "wb");
+    ASSERT_NE(file, nullptr);
+    fwrite("\xde\xad\xbe\xef", 1, 4, file);
+    fclose(file);
+    auto change = Cli("network nic eeprom change -n vmnic1 -m 1212436037 -f " + image);
+    EXPECT_EQ(change.status, 0) << change.out;
+    auto dump = Cli("--formatter=json network nic eeprom dump -n vmnic1 -l 4");
+    ASSERT_EQ(dump.status, 0) << dump.out;
+    EXPECT_EQ(json::parse(dump.out), json::parse(R"([{"Offset":"0000","Value":"de ad be ef "}])"));
+    const std::string link = dir_ + "/link.bin";
+    ASSERT_EQ(symlink(image.c_str(), link.c_str()), 0);
+    auto refused = Cli("network nic eeprom change -n vmnic1 -m 1212436037 -f " + link);
+    EXPECT_EQ(refused.status, 1);
+    EXPECT_EQ(refused.out, "Cannot use EEPROM file " + link + ": it is a symbolic link\n");
+
+    auto vfs = Cli("network sriovnic vf list -n vmnic5");
+    EXPECT_EQ(vfs.status, 0);
+    EXPECT_EQ(vfs.out.substr(0, vfs.out.find('\n')), "VF ID  Active  PCI Address   Owner World ID");
+    auto stats = Cli("network sriovnic vf stats -n vmnic5 -v 7");
+    EXPECT_EQ(stats.status, 1);
+    EXPECT_EQ(stats.out, "Unable to get VF Stats. Error:vmnic5 has no VF 7\n");
+}
+
 }  // namespace

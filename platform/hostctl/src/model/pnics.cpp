@@ -42,6 +42,21 @@ void ResolvePause(Pnic& nic) {
     }
 }
 
+void Renegotiate(Pnic& nic) {
+    const LinkMode* best = nullptr;
+    for (const auto& mode : nic.settings.advertisedModes) {
+        if (mode.speed == 0) continue;
+        if (!best || mode.speed > best->speed || (mode.speed == best->speed && mode.duplex == 1))
+            best = &mode;
+    }
+    if (best) {
+        nic.speed = best->speed;
+        nic.duplex = best->duplex == 2 ? 2 : 1;
+    }
+    nic.linkUp = nic.adminUp && nic.carrier;
+    ResolvePause(nic);
+}
+
 bool Supports(const Pnic& nic, const char* feature) {
     return std::find(nic.unsupported.begin(), nic.unsupported.end(), feature) == nic.unsupported.end();
 }
@@ -491,6 +506,13 @@ void Check(const PnicsSection& section, Lib::Checker& checker) {
         RequireUnique(
             nic.netqueue.plugins, [](const NetqueuePlugin& p) { return p.module + "/" + p.plugin; }, checker,
             "netqueue plugin");
+        if (nic.sriov.vfs.size() > nic.sriov.maxVfs)
+            checker.Fail(where + "more VFs than the adapter offers (" + std::to_string(nic.sriov.maxVfs) +
+                         ")");
+        const auto& q = nic.netqueue;
+        if ((q.maxTxQueues != 0 && q.txQueues > q.maxTxQueues) ||
+            (q.maxRxQueues != 0 && q.rxQueues > q.maxRxQueues))
+            checker.Fail(where + "more netqueues than the adapter offers");
         for (const auto& vf : nic.sriov.vfs) {
             if (vf.ownerWorldId != 0 && !checker.Get<WorldsSection>().Find(vf.ownerWorldId)) {
                 checker.Fail(where + "VF " + std::to_string(vf.id) + " is owned by unknown world " +

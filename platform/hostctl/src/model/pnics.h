@@ -299,4 +299,8 @@ Pnic& WritePnic(const std::string& name);
 // pause settings: nothing without link or negotiation, else the adapter's own choice.
 void ResolvePause(Pnic& nic);
 
+// Negotiates the link again: with a carrier on an adapter that is up, the link comes up at the
+// fastest advertised mode (full duplex first); pause is resolved again.
+void Renegotiate(Pnic& nic);
+
 }  // namespace TknCtl::Model

@@ -42,18 +42,6 @@ std::string DuplexText(std::uint32_t duplex) {
     return duplex == Net::PNIC_DUPLEX_FULL ? "full" : duplex == Net::PNIC_DUPLEX_HALF ? "half" : "auto";
 }
 
-// The mode auto-negotiation settles on: the fastest advertised one, full duplex first.
-const Model::LinkMode* BestAdvertisedMode(const Model::PnicSettings& settings) {
-    const Model::LinkMode* best = nullptr;
-    for (const auto& mode : settings.advertisedModes) {
-        if (mode.speed == 0) continue;
-        if (!best || mode.speed > best->speed ||
-            (mode.speed == best->speed && mode.duplex == Net::PNIC_DUPLEX_FULL))
-            best = &mode;
-    }
-    return best;
-}
-
 }  // namespace
 
 // ---------------------------------------------------------------- lookups
@@ -164,12 +152,7 @@ void PnicImpl::SetSpeedDuplex(std::uint32_t speed, std::uint32_t duplex) {
             throw HostCtlException(name_ + " does not support auto-negotiation");
         auto& nic = Model::WritePnic(name_);
         nic.settings.autoNegotiation = true;
-        if (const auto* best = BestAdvertisedMode(nic.settings)) {
-            nic.speed = best->speed;
-            nic.duplex =
-                best->duplex == Net::PNIC_DUPLEX_HALF ? Net::PNIC_DUPLEX_HALF : Net::PNIC_DUPLEX_FULL;
-        }
-        Model::ResolvePause(nic);
+        Model::Renegotiate(nic);
         return;
     }
     if (speed == 0 || (duplex != Net::PNIC_DUPLEX_FULL && duplex != Net::PNIC_DUPLEX_HALF)) {

@@ -1,4 +1,4 @@
-// VLAN statistics of switch uplinks.
+// VLAN statistics of switch uplinks: counted per VLAN while their collection is on.
 #include <algorithm>
 
 #include "core/section.h"
@@ -30,17 +30,37 @@ const Model::Pnic& Uplink(const std::string& switchName, const std::string& upli
 }
 }  // namespace
 
-std::vector<HostCtl::Network::VlanStats> UplinkVlanStats(const std::string& switchName, const std::string& uplink) {
+std::vector<HostCtl::Network::VlanStats> UplinkVlanStats(const std::string& switchName,
+                                                         const std::string& uplink) {
     const auto& nic = Uplink(switchName, uplink);
     std::vector<HostCtl::Network::VlanStats> stats;
     if (!nic.vlanStatsEnabled) return stats;
-    for (const auto& vlan : nic.vlanStats) stats.push_back({vlan.vlanId, vlan.rxPackets, vlan.txPackets});
+    for (const auto& vlan : nic.vlanStats)
+        stats.push_back({vlan.vlanId, vlan.rxPackets, vlan.txPackets});
     return stats;
 }
 
 void SetUplinkVlanStatsEnabled(const std::string& switchName, const std::string& uplink, bool enabled) {
     Uplink(switchName, uplink);
-    Lib::Write<Model::PnicsSection>().Find(uplink)->vlanStatsEnabled = enabled;
+    // The VLANs the switch's port groups carry are counted from the moment collection starts
+    // (4095 stands for all VLANs, not for one). Counters gathered before are kept.
+    std::vector<std::uint32_t> active;
+    if (const auto* vswitch = Lib::Read<Model::VSwitchesSection>().Find(switchName)) {
+        for (const auto& group : vswitch->portGroups) {
+            if (group.vlanId != Model::kMaxVlanId) active.push_back(group.vlanId);
+        }
+    }
+    auto& nic = *Lib::Write<Model::PnicsSection>().Find(uplink);
+    nic.vlanStatsEnabled = enabled;
+    if (!enabled) return;
+    for (auto vlanId : active) {
+        const bool counted =
+            std::any_of(nic.vlanStats.begin(), nic.vlanStats.end(),
+                        [&](const Model::VlanStats& entry) { return entry.vlanId == vlanId; });
+        if (!counted) nic.vlanStats.push_back({vlanId, 0, 0});
+    }
+    std::sort(nic.vlanStats.begin(), nic.vlanStats.end(),
+              [](const Model::VlanStats& a, const Model::VlanStats& b) { return a.vlanId < b.vlanId; });
 }
 
 }  // namespace TknCtl::Network::Internal

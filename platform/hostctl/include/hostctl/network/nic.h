@@ -1,5 +1,6 @@
-// Physical NICs (adapters): their general settings, link, pause, coalescing, offloads, rings
-// and the software simulation of offload features.
+// Physical NICs (adapters): their general settings, link, pause, coalescing, offloads, rings,
+// the software simulation of offload features, counters, diagnostics, netqueue, and the virtual
+// functions of SR-IOV adapters.
 //
 // An adapter object holds only the adapter's name and reads the host at each call; an
 // operation on an adapter that no longer exists throws HostCtlException. Records are filled
@@ -7,6 +8,7 @@
 // the whole request against what the adapter supports before it changes anything.
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <memory>
 #include <string>
@@ -222,6 +224,115 @@ struct PnicSoftwareSettings {
     bool geneveOffload = false;
 };
 
+// Packet counters of an adapter.
+struct PnicStats {
+    std::uint64_t rxPackets = 0;
+    std::uint64_t txPackets = 0;
+    std::uint64_t rxBytes = 0;
+    std::uint64_t txBytes = 0;
+    std::uint64_t rxDropped = 0;
+    std::uint64_t txDropped = 0;
+    std::uint64_t rxMulticast = 0;
+    std::uint64_t rxBroadcast = 0;
+    std::uint64_t txMulticast = 0;
+    std::uint64_t txBroadcast = 0;
+    std::uint64_t rxErrors = 0;
+    std::uint64_t rxLengthErrors = 0;
+    std::uint64_t rxOverErrors = 0;
+    std::uint64_t rxCrcErrors = 0;
+    std::uint64_t rxFrameErrors = 0;
+    std::uint64_t rxFifoErrors = 0;
+    std::uint64_t rxMissedErrors = 0;
+    std::uint64_t txErrors = 0;
+    std::uint64_t txAbortedErrors = 0;
+    std::uint64_t txCarrierErrors = 0;
+    std::uint64_t txFifoErrors = 0;
+    std::uint64_t txHeartbeatErrors = 0;
+    std::uint64_t txWindowErrors = 0;
+};
+
+// What a driver self test reports: whether a test failed and one line per test.
+struct PnicSelfTestResult {
+    bool failed = false;
+    std::vector<std::string> info;
+};
+
+// Netqueue load-balancer features, as mask bits; index i of the flag arrays is bit 1 << i.
+constexpr std::uint32_t PNIC_NETQ_LB_RXQPAIR = 0x1;
+constexpr std::uint32_t PNIC_NETQ_LB_RXQNOFEATURE = 0x2;
+constexpr std::uint32_t PNIC_NETQ_LB_PREEMPTIBLEQ = 0x4;
+constexpr std::uint32_t PNIC_NETQ_LB_RXQLATENCY = 0x8;
+constexpr std::uint32_t PNIC_NETQ_LB_RXDYNAMICLB = 0x10;
+constexpr std::uint32_t PNIC_NETQ_LB_DYNAMICQPOOL = 0x20;
+constexpr std::uint32_t PNIC_NETQ_LB_MACLEARNLB = 0x40;
+constexpr std::uint32_t PNIC_NETQ_LB_RSS = 0x80;
+constexpr std::uint32_t PNIC_NETQ_LB_LRO = 0x100;
+constexpr std::uint32_t PNIC_NETQ_LB_GENEVEOAM = 0x200;
+constexpr std::size_t PNIC_NETQ_LB_FEATURE_COUNT = 10;
+
+struct PnicNetqueuePluginInfo {
+    std::string moduleName;
+    std::string pluginName;
+    std::string description;
+};
+
+// The netqueue record. GetNetqueueInfo fills everything but the marks; SetNetqueueInfo
+// applies the parts its marks select: the "allowed" flags of the features in lbMask, the TX
+// and RX counts, the balancer state, and the plugin state (pluginEnabled) of every plugin
+// listed in plugins.
+struct PnicNetqueueInfo {
+    std::uint32_t lbMask = 0;
+    std::uint32_t txQueueCount = 0;
+    std::uint32_t rxQueueCount = 0;
+    bool setTxCount = false;
+    bool setRxCount = false;
+    bool stateChanged = false;
+    bool pluginChanged = false;
+    bool balancerEnabled = false;
+    bool pluginEnabled = false;
+    std::array<bool, PNIC_NETQ_LB_FEATURE_COUNT> lbAllowed{};
+    std::array<bool, PNIC_NETQ_LB_FEATURE_COUNT> lbSupported{};
+    bool filterMacOnly = false;
+    bool filterVlanOnly = false;
+    bool filterVlanMac = false;
+    bool filterVxlan = false;
+    bool filterGeneve = false;
+    bool filterGenericEncap = false;
+    std::vector<PnicNetqueuePluginInfo> plugins;
+    std::vector<PnicNetqueuePluginInfo> enabledPlugins;
+};
+
+// A virtual function of an SR-IOV adapter; the owner is a World ID, empty when the VF is free.
+struct SriovNicVFInfo {
+    std::uint8_t vfId = 0;
+    bool active = false;
+    std::string pciAddress;
+    std::string ownerWorldId;
+};
+
+struct SriovNicVFStats {
+    std::uint64_t rxUnicastPkts = 0;
+    std::uint64_t rxUnicastBytes = 0;
+    std::uint64_t rxMulticastPkts = 0;
+    std::uint64_t rxMulticastBytes = 0;
+    std::uint64_t rxBroadcastPkts = 0;
+    std::uint64_t rxBroadcastBytes = 0;
+    std::uint64_t rxOutOfBufferDrops = 0;
+    std::uint64_t rxErrorDrops = 0;
+    std::uint64_t rxLroPkts = 0;
+    std::uint64_t rxLroBytes = 0;
+    std::uint64_t txUnicastPkts = 0;
+    std::uint64_t txUnicastBytes = 0;
+    std::uint64_t txMulticastPkts = 0;
+    std::uint64_t txMulticastBytes = 0;
+    std::uint64_t txBroadcastPkts = 0;
+    std::uint64_t txBroadcastBytes = 0;
+    std::uint64_t txErrors = 0;
+    std::uint64_t txDiscards = 0;
+    std::uint64_t txTsoPkts = 0;
+    std::uint64_t txTsoBytes = 0;
+};
+
 // A physical NIC of the host.
 class Pnic {
 public:
@@ -265,6 +376,25 @@ public:
     virtual void SetRingParams(const PnicRingParams& params) = 0;
     virtual void GetSoftwareSettings(PnicSoftwareSettings& settings) const = 0;
     virtual void SetSoftwareSettings(const PnicSoftwareSettings& settings) = 0;
+    // Diagnostics. The register image in register order.
+    virtual void GetRegisterDump(std::vector<std::uint8_t>& bytes) const = 0;
+    // EEPROM bytes from offset on: length of them (0: to the end), cut at the end of the
+    // EEPROM; an offset outside the EEPROM or a negative length is refused.
+    virtual void GetEepromDump(std::vector<std::uint8_t>& bytes, std::int64_t length,
+                               std::int64_t offset) const = 0;
+    // Writes one double word (little endian) at offset; magic must be the EEPROM's key.
+    virtual void SetEepromValue(std::int64_t magic, std::int64_t offset, std::int64_t value) = 0;
+    // Writes a file's content from offset 0; the file must be a regular file (not a symbolic
+    // link) no larger than the EEPROM.
+    virtual void SetEepromFromFile(std::int64_t magic, const std::string& file) = 0;
+    // The online test runs only the tests that leave the adapter in service.
+    virtual void RunSelfTest(PnicSelfTestResult& result, bool online) = 0;
+    // Restarts auto-negotiation; refused when auto-negotiation is off.
+    virtual void RestartNegotiation() = 0;
+
+    // Netqueue.
+    virtual void GetNetqueueInfo(PnicNetqueueInfo& info) const = 0;
+    virtual void SetNetqueueInfo(const PnicNetqueueInfo& info) = 0;
 };
 
 }  // namespace HostCtl::Network
@@ -309,6 +439,18 @@ public:
     void SetRingParams(const HostCtl::Network::PnicRingParams& params) override;
     void GetSoftwareSettings(HostCtl::Network::PnicSoftwareSettings& settings) const override;
     void SetSoftwareSettings(const HostCtl::Network::PnicSoftwareSettings& settings) override;
+    void GetRegisterDump(std::vector<std::uint8_t>& bytes) const override;
+    void GetEepromDump(std::vector<std::uint8_t>& bytes, std::int64_t length,
+                       std::int64_t offset) const override;
+    void SetEepromValue(std::int64_t magic, std::int64_t offset, std::int64_t value) override;
+    void SetEepromFromFile(std::int64_t magic, const std::string& file) override;
+    void RunSelfTest(HostCtl::Network::PnicSelfTestResult& result, bool online) override;
+    void RestartNegotiation() override;
+    void GetNetqueueInfo(HostCtl::Network::PnicNetqueueInfo& info) const override;
+    void SetNetqueueInfo(const HostCtl::Network::PnicNetqueueInfo& info) override;
+
+    // The adapter's packet counters.
+    void GetPnicStats(HostCtl::Network::PnicStats& stats) const;
 
 private:
     std::string name_;

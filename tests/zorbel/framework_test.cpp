@@ -7,6 +7,7 @@
 #include <sstream>
 
 #include "zorbel/dispatcher.h"
+#include "zorbel/formatter.h"
 
 namespace {
 
@@ -314,6 +315,17 @@ TEST(Formatters, JsonKeepsEveryFieldAndEscapes) {
     EXPECT_EQ(Cli({"--formatter=json", "test", "scalar", "raw"}).out,
               "\"tab\\there \\u001b[31m\\ufffd end\"\n");
     EXPECT_EQ(Cli({"--formatter=json", "test", "scalar", "strings"}).out, "[\"a\",\"b\\\"c\"]\n");
+}
+
+TEST(Formatters, TextFromTheHostCannotDriveTheTerminal) {
+    // Control characters and stray bytes are shown as escapes by simple and table; JSON escapes
+    // them its own way.
+    EXPECT_EQ(Cli({"test", "scalar", "raw"}).out, "tab\\there \\x1b[31m\\xff end\n");
+    EXPECT_EQ(Zorbel::Format::TerminalSafe("a\r\nb\x7f\xc2\x9b[2J\xc3\xa9"), "a\\r\\nb\\x7f\\u009b[2J\xc3\xa9");
+    EXPECT_EQ(Zorbel::Format::TerminalSafe("plain text"), "plain text");
+    std::string json;
+    Zorbel::Format::AppendJsonString(json, "\xc2\x9b\xe2\x82");
+    EXPECT_EQ(json, "\"\\u009b\\ufffd\\ufffd\"");
 }
 
 TEST(Formatters, Scalars) {

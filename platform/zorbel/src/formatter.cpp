@@ -73,6 +73,34 @@ std::vector<std::string> WrapText(const std::string& text, std::size_t width) {
 
 namespace {
 
+// The length of the well-formed UTF-8 sequence at p (2 to 4 bytes), or 0 when there is none:
+// a stray continuation byte, a cut sequence, an overlong form, a surrogate or a value past
+// U+10FFFF.
+std::size_t Utf8SequenceLength(const unsigned char* p, std::size_t remaining) {
+    unsigned char c = p[0];
+    std::size_t length = 0;
+    unsigned int codePoint = 0;
+    if (c >= 0xC2 && c <= 0xDF) {
+        length = 2;
+        codePoint = c & 0x1F;
+    } else if (c >= 0xE0 && c <= 0xEF) {
+        length = 3;
+        codePoint = c & 0x0F;
+    } else if (c >= 0xF0 && c <= 0xF4) {
+        length = 4;
+        codePoint = c & 0x07;
+    }
+    if (length == 0 || length > remaining) return 0;
+    for (std::size_t k = 1; k < length; ++k) {
+        if ((p[k] & 0xC0) != 0x80) return 0;
+        codePoint = (codePoint << 6) | (p[k] & 0x3F);
+    }
+    if ((length == 3 && codePoint < 0x800) || (length == 4 && codePoint < 0x10000) ||
+        (codePoint >= 0xD800 && codePoint <= 0xDFFF) || codePoint > 0x10FFFF)
+        return 0;
+    return length;
+}
+
 // ---------------------------------------------------------------- JSON
 
 void AppendJson(std::string& out, const MetaObject* value) {
@@ -244,7 +272,7 @@ public:
     }
 
     // Text from the host as it is shown on a terminal.
-    static std::string Display(const std::string& text) { return text; }
+    static std::string Display(const std::string& text) { return TerminalSafe(text); }
 
     const OutputParameters& parameters() const { return parameters_; }
 
@@ -508,45 +536,76 @@ void AppendJsonString(std::string& out, const std::string& text) {
             continue;
         }
         // A UTF-8 sequence: copy it when it is well formed, else one replacement per byte.
-        std::size_t length = 0;
-        unsigned int codePoint = 0;
-        if (c >= 0xC2 && c <= 0xDF) {
-            length = 2;
-            codePoint = c & 0x1F;
-        } else if (c >= 0xE0 && c <= 0xEF) {
-            length = 3;
-            codePoint = c & 0x0F;
-        } else if (c >= 0xF0 && c <= 0xF4) {
-            length = 4;
-            codePoint = c & 0x07;
-        }
-        bool valid = length != 0 && i + length <= size;
-        for (std::size_t k = 1; valid && k < length; ++k) {
-            if ((bytes[i + k] & 0xC0) != 0x80) valid = false;
-            codePoint = (codePoint << 6) | (bytes[i + k] & 0x3F);
-        }
-        if (valid) {
-            // Overlong forms, surrogates and values past U+10FFFF are not UTF-8.
-            if ((length == 3 && codePoint < 0x800) || (length == 4 && codePoint < 0x10000) ||
-                (codePoint >= 0xD800 && codePoint <= 0xDFFF) || codePoint > 0x10FFFF)
-                valid = false;
-        }
-        if (valid) {
-            if (codePoint >= 0x80 && codePoint <= 0x9F) {
-                // C1 control characters are escaped like the C0 ones.
-                out += "\\u00";
-                out += hex[codePoint >> 4];
-                out += hex[codePoint & 0xf];
-            } else {
-                out.append(text, i, length);
-            }
-            i += length;
-        } else {
+        std::size_t length = Utf8SequenceLength(bytes + i, size - i);
+        if (length == 0) {
             out += "\\ufffd";
             ++i;
+        } else if (length == 2 && c == 0xC2 && bytes[i + 1] <= 0x9F) {
+            // C1 control characters are escaped like the C0 ones.
+            out += "\\u00";
+            out += hex[bytes[i + 1] >> 4];
+            out += hex[bytes[i + 1] & 0xf];
+            i += 2;
+        } else {
+            out.append(text, i, length);
+            i += length;
         }
     }
     out += '"';
+}
+
+std::string TerminalSafe(const std::string& text) {
+    static const char hex[] = "0123456789abcdef";
+    auto escape = [](std::string& out, unsigned int value, bool unicode) {
+        out += unicode ? "\\u00" : "\\x";
+        out += hex[(value >> 4) & 0xf];
+        out += hex[value & 0xf];
+    };
+    // Most values need nothing: keep them as they are.
+    bool plain = true;
+    for (unsigned char c : text) {
+        if (c < 0x20 || c >= 0x7f) {
+            plain = false;
+            break;
+        }
+    }
+    if (plain) return text;
+
+    std::string out;
+    out.reserve(text.size() + 8);
+    const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
+    std::size_t i = 0;
+    while (i < text.size()) {
+        unsigned char c = bytes[i];
+        if (c < 0x80) {
+            switch (c) {
+                case '\t': out += "\\t"; break;
+                case '\n': out += "\\n"; break;
+                case '\r': out += "\\r"; break;
+                default:
+                    if (c < 0x20 || c == 0x7f) {
+                        escape(out, c, false);
+                    } else {
+                        out += static_cast<char>(c);
+                    }
+            }
+            ++i;
+            continue;
+        }
+        std::size_t length = Utf8SequenceLength(bytes + i, text.size() - i);
+        if (length == 0) {
+            escape(out, c, false);  // not UTF-8: a lone byte could act as a control code
+            ++i;
+            continue;
+        }
+        if (length == 2 && c == 0xC2 && bytes[i + 1] <= 0x9F) {
+            escape(out, bytes[i + 1], true);  // C1 control character
+        } else {
+            out.append(text, i, length);
+        }
+        i += length;
+    }
+    return out;
 }
 
 void Render(const std::string& formatter, const MetaObj::MetaObject& root, const OutputParameters& parameters,

@@ -42,6 +42,11 @@ void Render(const std::string& formatter, const MetaObj::MetaObject& root, const
 // valid UTF-8 become U+FFFD.
 void AppendJsonString(std::string& out, const std::string& text);
 
+// Text from the host as the simple and table formatters show it: control characters (C0,
+// DEL, C1) and bytes that are not UTF-8 are written as escapes (\t, \n, \r, \xNN, \u00NN),
+// so that a name cannot drive the terminal.
+std::string TerminalSafe(const std::string& text);
+
 // Splits text into lines of at most width characters at blanks (a longer word stands on a
 // line of its own).
 std::vector<std::string> WrapText(const std::string& text, std::size_t width);

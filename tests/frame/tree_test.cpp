@@ -1,8 +1,11 @@
 // The shape of the "network" tree as the plug-in registers it.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <functional>
+#include <set>
 #include <sstream>
+#include <typeinfo>
 
 #include "zorbel/dispatcher.h"
 
@@ -88,6 +91,48 @@ TEST(Tree, DescriptionsAndCreationOrder) {
     EXPECT_EQ(namespaces(Resolve("network vswitch dvs talvex")), (std::vector<std::string>{"lacp"}));
     EXPECT_EQ(namespaces(Resolve("network vswitch dvs talvex lacp")),
               (std::vector<std::string>{"config", "status", "stats", "timeout"}));
+}
+
+TEST(Tree, EveryCommandIsRegisteredOnce) {
+    int commands = 0;
+    std::set<const void*> objects;
+    std::function<void(const std::shared_ptr<NamespaceNode>&)> walk = [&](const auto& node) {
+        for (const auto& child : node->GetNamespaceNodes()) {
+            if (child->GetType() == Zorbel::AutoCli::NODE_COMMAND) {
+                ++commands;
+                objects.insert(child.get());
+                EXPECT_FALSE(child->GetDescription().empty()) << child->GetPathString(' ');
+            } else {
+                walk(child);
+            }
+        }
+    };
+    walk(Network());
+    EXPECT_EQ(commands, 143);
+    // Each registration has an object of its own, also the class registered twice.
+    EXPECT_EQ(objects.size(), 143u);
+
+    // The listing has one line per command, also for descriptions of several lines.
+    std::ostringstream listing;
+    Zorbel::AutoCli::GlobalOptions options;
+    Network()->GetDispatcher()->WriteCommandList(options, listing);
+    std::string text = listing.str();
+    EXPECT_EQ(std::count(text.begin(), text.end(), '\n'), 143);
+    EXPECT_NE(text.find("as follows, S: Setting supported by device U: "), std::string::npos);
+
+    auto get = std::dynamic_pointer_cast<Zorbel::AutoCli::Command>(Resolve("network ip interface ipv4 get"));
+    auto list = std::dynamic_pointer_cast<Zorbel::AutoCli::Command>(
+        Resolve("network ip interface ipv4 address list"));
+    ASSERT_NE(get, nullptr);
+    ASSERT_NE(list, nullptr);
+    EXPECT_NE(get, list);
+    EXPECT_EQ(typeid(*get), typeid(*list));
+    EXPECT_EQ(get->GetDescription(), list->GetDescription());
+    auto a = get->GetInputSpec()->GetParameters();
+    auto b = list->GetInputSpec()->GetParameters();
+    ASSERT_EQ(a.size(), b.size());
+    for (std::size_t i = 0; i < a.size(); ++i)
+        EXPECT_TRUE(a[i]->SameAs(*b[i]));
 }
 
 TEST(Tree, PluginExportsOnlyTheEntryPoint) {

@@ -195,7 +195,15 @@ void Dispatcher::WriteCommandList(const GlobalOptions& options, std::ostream& ou
         for (const auto& [path, command] : commands) {
             text += path;
             text += '\t';
-            text += command->GetDescription();
+            // One line per command: a description of several lines is joined with blanks.
+            std::string description = command->GetDescription();
+            while (!description.empty() && (description.back() == '\n' || description.back() == ' ')) {
+                description.pop_back();
+            }
+            for (char& c : description) {
+                if (c == '\n') c = ' ';
+            }
+            text += description;
             text += '\n';
         }
     }

@@ -89,7 +89,7 @@ struct Param {
     Constraint constraint = {};
 };
 
-// The parameter specification: for each parameter in order, New(name, type), then
+// The InputSpec: for each parameter in order, New(name, type), then
 // SetShortName, SetDescription, SetConstraint (when constrained), SetRequired, AddParameter.
 std::shared_ptr<Zorbel::CallSpec::ParameterSpec> MakeParameter(const Param& param);
 InputSpecPtr MakeInputSpec(const std::vector<Param>& params);

@@ -9,7 +9,7 @@
 
 namespace TalvexCli::NetworkNamespace {
 
-// Parameter names, shared by each command's parameter specification and its execution.
+// Parameter names, shared by each command's parameter declarations and its execution.
 namespace EnsParam {
 inline const std::string kMaxLcores = "maxlcores";
 inline const std::string kLcoreId = "lcore-id";

@@ -125,7 +125,7 @@ class VirtualSwitchPortGroupSet : public virtual Zorbel::AutoCli::Command {
 
 // ---------------------------------------------------------------- shared policy parameters
 
-// Declare the optional parameters of one policy on a command's input specification.
+// Declare the optional parameters of one policy on a command's InputSpec.
 void AddFailoverParameters(const InputSpecPtr& spec);
 void AddSecurityParameters(const InputSpecPtr& spec);
 void AddShapingParameters(const InputSpecPtr& spec);

@@ -7,7 +7,7 @@ root=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
 "$root/scripts/install-deps.sh"
 
 dir="$root/build"
-args=(-DCMAKE_BUILD_TYPE=RelWithDebInfo)
+args=(-DCMAKE_BUILD_TYPE=Release)
 while [ $# -gt 0 ]; do
     case "$1" in
         --sanitize) dir="$root/build-asan"; args=(-DCMAKE_BUILD_TYPE=Debug -DHADRO_SANITIZE=ON) ;;

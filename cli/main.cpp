@@ -12,6 +12,7 @@
 
 #include "hostctl/session.h"
 #include "zorbel/dispatcher.h"
+#include "zorbel/formatter.h"
 
 namespace {
 
@@ -110,7 +111,7 @@ int main(int argc, char** argv) {
         std::cout.flush();
         return status;
     } catch (const std::exception& e) {
-        std::cerr << "Error: unexpected failure: " << e.what() << '\n';
+        std::cerr << "Error: unexpected failure: " << Zorbel::Format::TerminalSafeLines(e.what()) << '\n';
     } catch (...) {
         std::cerr << "Error: unexpected failure\n";
     }

@@ -69,7 +69,7 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
         if (TakeGlobalValue(args, i, "formatter", value, error)) {
             if (!error.empty()) return false;
             if (!Format::IsFormatter(value)) {
-                error = "unknown formatter '" + value + "' for --formatter (choose from ";
+                error = "unknown formatter '" + Options::Shown(value) + "' for --formatter (choose from ";
                 const auto& names = Format::FormatterNames();
                 for (std::size_t k = 0; k < names.size(); ++k)
                     error += (k ? ", " : "") + names[k];
@@ -92,7 +92,7 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
             if (!error.empty()) return false;
             auto eq = value.find('=');
             if (eq == std::string::npos || eq == 0) {
-                error = "option --format-param needs KEY=VALUE, got '" + value + "'";
+                error = "option --format-param needs KEY=VALUE, got '" + Options::Shown(value) + "'";
                 return false;
             }
             options.formatParameters.emplace_back(value.substr(0, eq), value.substr(eq + 1));
@@ -103,7 +103,7 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
         } else if (arg == "--version") {
             options.version = true;
         } else {
-            error = "unknown global option " + arg;
+            error = "unknown global option " + Options::Shown(arg);
             return false;
         }
     }
@@ -138,7 +138,8 @@ int Dispatcher::LoadPluginDirectories(const std::vector<std::string>& dirs, std:
             if (LoadPlugin(path, error)) {
                 ++loaded;
             } else {
-                err << "Warning: plug-in " << path << " not loaded: " << error << '\n';
+                err << "Warning: plug-in " << Format::TerminalSafe(path) << " not loaded: " << Format::TerminalSafeLines(error)
+                    << '\n';
             }
         }
     }
@@ -244,7 +245,7 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         auto child = node->GetNamespaceNode(word);
         if (!child) {
             std::string where = node == root_ ? programName_ : node->GetPathString(' ');
-            err << "Error: Unknown command or namespace '" << word << "' in '" << where << "'. "
+            err << "Error: Unknown command or namespace '" << Options::Shown(word) << "' in '" << where << "'. "
                 << Help::ValidChoices(*node) << '\n';
             err << Help::UsageHint(programName_, node == root_ ? "" : node->GetPathString(' '));
             result.status = EXIT_REFUSED;
@@ -272,7 +273,7 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         }
         if (!rest.empty()) {
             err << "Error: '" << (node == root_ ? programName_ : node->GetPathString(' '))
-                << "' is a namespace, not a command; " << rest.front() << " is not valid here.\n";
+                << "' is a namespace, not a command; " << Options::Shown(rest.front()) << " is not valid here.\n";
         }
         err << (node == root_ ? Help::ProgramUsage(programName_, *node)
                               : Help::NamespaceText(programName_, *node));
@@ -334,7 +335,8 @@ int Dispatcher::Execute(const Invocation& invocation, const GlobalOptions& optio
             Format::Render(formatter, *root, parameters, rendered);
         }
     } catch (const std::exception& e) {
-        err << "Error: unexpected failure in '" << invocation.path << "': " << e.what() << '\n';
+        err << "Error: unexpected failure in '" << invocation.path << "': " << Format::TerminalSafeLines(e.what())
+            << '\n';
         return EXIT_UNEXPECTED;
     } catch (...) {
         err << "Error: unexpected failure in '" << invocation.path << "'\n";
@@ -342,8 +344,10 @@ int Dispatcher::Execute(const Invocation& invocation, const GlobalOptions& optio
     }
     out << rendered;
     std::string messages;
+    // Messages often quote names from the host or text from the command line: whatever they
+    // hold, they must not drive the terminal.
     for (const auto& message : output->GetErrorMessages()) {
-        messages += message;
+        messages += Format::TerminalSafeLines(message);
         messages += '\n';
     }
     err << messages;

@@ -608,6 +608,19 @@ std::string TerminalSafe(const std::string& text) {
     return out;
 }
 
+std::string TerminalSafeLines(const std::string& text) {
+    std::string out;
+    std::size_t start = 0;
+    while (true) {
+        std::size_t end = text.find('\n', start);
+        out += TerminalSafe(text.substr(start, end == std::string::npos ? std::string::npos : end - start));
+        if (end == std::string::npos) break;
+        out += '\n';
+        start = end + 1;
+    }
+    return out;
+}
+
 void Render(const std::string& formatter, const MetaObj::MetaObject& root, const OutputParameters& parameters,
             std::string& out) {
     if (formatter == "json") {

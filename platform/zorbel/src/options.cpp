@@ -4,6 +4,8 @@
 #include <charconv>
 #include <set>
 
+#include "zorbel/formatter.h"
+
 namespace Zorbel::Options {
 
 using CallSpec::ParameterConstraint;
@@ -19,11 +21,21 @@ std::string Lower(const std::string& text) {
     return lower;
 }
 
-// Quotes a value for a message; very long values are cut.
-std::string Quote(const std::string& value) {
+}  // namespace
+
+// Text from the command line as a message shows it: very long text is cut, control
+// characters are escaped (a message must not drive the terminal).
+std::string Shown(const std::string& text) {
     constexpr std::size_t limit = 64;
-    if (value.size() <= limit) return "'" + value + "'";
-    return "'" + value.substr(0, limit) + "...'";
+    if (text.size() <= limit) return Format::TerminalSafe(text);
+    return Format::TerminalSafe(text.substr(0, limit)) + "...";
+}
+
+namespace {
+
+// Quotes a value for a message.
+std::string Quote(const std::string& value) {
+    return "'" + Shown(value) + "'";
 }
 
 std::string JoinInts(const std::vector<long>& values) {
@@ -179,7 +191,7 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
             }
             parameter = spec.FindParameter(name);
             if (!parameter) {
-                error = "unknown option --" + name;
+                error = "unknown option --" + Shown(name);
                 if (name == "formatter" || name == "state" || name == "plugin-dir" ||
                     name == "format-param") {
                     error += " (global options go before the first word)";
@@ -195,7 +207,7 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
             }
             parameter = spec.FindShortParameter(name);
             if (!parameter) {
-                error = "unknown option -" + name;
+                error = "unknown option -" + Shown(name);
                 return false;
             }
         } else {

@@ -16,6 +16,10 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
 // Parses a decimal integer with an optional sign that fits in 64 bits.
 bool ParseInteger(const std::string& text, std::int64_t& value, bool& overflow);
 
+// Text from the command line as a message shows it: cut when very long, control characters
+// escaped.
+std::string Shown(const std::string& text);
+
 // true/false, yes/no, on/off, 1/0 in any case.
 bool ParseBoolean(const std::string& text, bool& value);
 

@@ -58,8 +58,9 @@ TEST_F(PortGroupTest, AddKeepsTheHostsRules) {
               "Unable to add port group ' Lab': a name holds only printable characters and neither starts "
               "nor ends "
               "with a blank"},
+             // The message escapes the tab: text on the terminal never carries control characters.
              {"-p 'Lab\tNet' -v vSwitch0",
-              "Unable to add port group 'Lab\tNet': a name holds only printable characters and neither "
+              "Unable to add port group 'Lab\\tNet': a name holds only printable characters and neither "
               "starts nor "
               "ends with a blank"},
              {"-p Port-group-with-a-name-that-runs-on-to-sixty-characters-long -v vSwitch0",

@@ -46,6 +46,9 @@ void AppendJsonString(std::string& out, const std::string& text);
 // DEL, C1) and bytes that are not UTF-8 are written as escapes (\t, \n, \r, \xNN, \u00NN),
 // so that a name cannot drive the terminal.
 std::string TerminalSafe(const std::string& text);
+// The same for messages of several lines (errors on stderr): line breaks stay as they are,
+// everything else a terminal would act on is escaped.
+std::string TerminalSafeLines(const std::string& text);
 
 // Splits text into lines of at most width characters at blanks (a longer word stands on a
 // line of its own).

@@ -2,8 +2,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <climits>
 #include <cstdlib>
+#include <cstring>
+#include <fstream>
 #include <iostream>
 #include <memory>
 #include <sstream>
@@ -82,6 +85,184 @@ int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invo
     return status;
 }
 
+// Splits one line of a batch into words, as a POSIX shell does for plain words: blanks
+// separate words; '...' keeps everything literally; "..." keeps blanks and takes a backslash
+// before " or \ as escaping it; elsewhere a backslash makes the next character literal; '#'
+// at the start of a word begins a comment that runs to the end of the line. Returns false
+// and sets error for a quote that is not closed or a backslash that ends the line.
+bool SplitBatchLine(const std::string& line, std::vector<std::string>& words, std::string& error) {
+    words.clear();
+    std::string word;
+    bool inWord = false;
+    for (std::size_t i = 0; i < line.size(); ++i) {
+        char c = line[i];
+        if (c == ' ' || c == '\t' || c == '\r') {
+            if (inWord) words.push_back(std::move(word));
+            word.clear();
+            inWord = false;
+        } else if (c == '#' && !inWord) {
+            break;
+        } else if (c == '\\') {
+            if (i + 1 >= line.size()) {
+                error = "the line ends with a backslash";
+                return false;
+            }
+            word += line[++i];
+            inWord = true;
+        } else if (c == '\'') {
+            std::size_t close = line.find('\'', i + 1);
+            if (close == std::string::npos) {
+                error = "a single quote is not closed";
+                return false;
+            }
+            word.append(line, i + 1, close - i - 1);
+            i = close;
+            inWord = true;
+        } else if (c == '"') {
+            ++i;
+            while (i < line.size() && line[i] != '"') {
+                if (line[i] == '\\' && i + 1 < line.size() && (line[i + 1] == '"' || line[i + 1] == '\\'))
+                    ++i;
+                word += line[i++];
+            }
+            if (i >= line.size()) {
+                error = "a double quote is not closed";
+                return false;
+            }
+            inWord = true;
+        } else {
+            word += c;
+            inWord = true;
+        }
+    }
+    if (inWord) words.push_back(std::move(word));
+    return true;
+}
+
+// Runs the command lines of a batch (a file, or standard input for "-") in one process and
+// one session. Each line is what would follow hadrocli's global options; a line may set its
+// own --formatter and --format-param. Without --atomic every line is a transaction of its
+// own, as if hadrocli ran it (the state is written after a line only when it changed
+// something), and the batch goes on after a failure. With --atomic the batch is one
+// transaction: it stops at the first line that does not succeed, writes nothing, prints
+// nothing on stdout, and the state is written once at the end when every line succeeded.
+// A failing line is reported on stderr as "line N: TEXT" after its own messages. The exit
+// status is 0 when every line succeeded, else that of the first failing line.
+int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
+    using HostCtl::Lib::HostSession;
+    using HostCtl::Lib::StateFileError;
+    std::ifstream file;
+    std::istream* input = &std::cin;
+    const bool interactive = options.batch == "-";
+    if (!interactive) {
+        file.open(options.batch, std::ios::binary);
+        if (!file) {
+            std::cerr << "Error: batch file " << Zorbel::Format::TerminalSafe(options.batch)
+                      << ": cannot read: " << std::strerror(errno) << '\n';
+            return Zorbel::AutoCli::EXIT_UNEXPECTED;
+        }
+        input = &file;
+    }
+
+    std::unique_ptr<HostSession> session;
+    std::string heldOut;  // --atomic: everything waits for the commit
+    std::string heldErr;
+    int first = Zorbel::AutoCli::EXIT_OK;
+    std::string line;
+    std::vector<std::string> words;
+    std::ostringstream out;
+    std::ostringstream err;
+    for (std::size_t number = 1; std::getline(*input, line); ++number) {
+        out.str({});
+        err.str({});
+        int status = Zorbel::AutoCli::EXIT_OK;
+        std::string error;
+        GlobalOptions own;
+        std::vector<std::string> rest;
+        if (!SplitBatchLine(line, words, error)) {
+            err << "Error: " << error << '\n';
+            status = Zorbel::AutoCli::EXIT_REFUSED;
+        } else if (words.empty()) {
+            continue;  // blank or a comment
+        } else if (!Zorbel::AutoCli::ParseGlobalOptions(words, own, rest, error)) {
+            err << "Error: " << error << '\n';
+            status = Zorbel::AutoCli::EXIT_REFUSED;
+        } else if (!own.statePath.empty() || !own.pluginDirs.empty() || !own.batch.empty() || own.atomic) {
+            err << "Error: only --formatter and --format-param may stand before the words of a batch line\n";
+            status = Zorbel::AutoCli::EXIT_REFUSED;
+        } else {
+            GlobalOptions lineOptions = own;
+            lineOptions.statePath = options.statePath;
+            lineOptions.pluginDirs = options.pluginDirs;
+            if (!own.formatterGiven) {
+                lineOptions.formatter = options.formatter;
+                lineOptions.formatterGiven = options.formatterGiven;
+            }
+            lineOptions.formatParameters = options.formatParameters;
+            lineOptions.formatParameters.insert(lineOptions.formatParameters.end(),
+                                                own.formatParameters.begin(), own.formatParameters.end());
+            auto prepared = dispatcher.Prepare(rest, lineOptions, out, err);
+            status = prepared.status;
+            if (prepared.ready) {
+                try {
+                    if (!session)
+                        session = HostSession::OpenFile(HostCtl::Lib::ResolveStatePath(options.statePath));
+                    status = dispatcher.Execute(prepared.invocation, lineOptions, out, err);
+                    if (!options.atomic) {
+                        // As for a single command line: a command that ran to its end is
+                        // committed, one that ended in an unexpected failure leaves nothing.
+                        if (status == Zorbel::AutoCli::EXIT_OK || status == Zorbel::AutoCli::EXIT_FAILED) {
+                            session->Commit();
+                        } else {
+                            session->Rollback();
+                        }
+                    }
+                } catch (const StateFileError& e) {
+                    // The state cannot be used: no later line could run either.
+                    std::cerr << "Error: " << e.what() << '\n'
+                              << "line " << number << ": " << Zorbel::Format::TerminalSafe(line) << '\n';
+                    return Zorbel::AutoCli::EXIT_UNEXPECTED;
+                }
+            }
+        }
+        if (status != Zorbel::AutoCli::EXIT_OK) {
+            err << "line " << number << ": " << Zorbel::Format::TerminalSafe(line) << '\n';
+            if (options.atomic) {
+                // Nothing of the batch took effect: its output would describe changes that
+                // never happened. The session closes without writing.
+                std::cerr << err.str();
+                return status;
+            }
+            if (first == Zorbel::AutoCli::EXIT_OK) first = status;
+        }
+        if (options.atomic) {
+            heldOut += out.str();
+            heldErr += err.str();
+        } else {
+            std::cout << out.str();
+            std::cerr << err.str();
+            if (interactive) std::cout.flush();
+        }
+    }
+    if (input->bad()) {
+        std::cerr << "Error: batch "
+                  << (interactive ? "from standard input" : Zorbel::Format::TerminalSafe(options.batch))
+                  << ": cannot read\n";
+        return Zorbel::AutoCli::EXIT_UNEXPECTED;
+    }
+    if (options.atomic && session) {
+        try {
+            session->Commit();
+        } catch (const StateFileError& e) {
+            std::cerr << "Error: " << e.what() << '\n';
+            return Zorbel::AutoCli::EXIT_UNEXPECTED;
+        }
+    }
+    std::cout << heldOut;
+    std::cerr << heldErr;
+    return first;
+}
+
 int Main(int argc, char** argv) {
     std::vector<std::string> args(argv + 1, argv + argc);
     GlobalOptions options;
@@ -94,8 +275,23 @@ int Main(int argc, char** argv) {
         return Zorbel::AutoCli::EXIT_REFUSED;
     }
 
+    if (options.atomic && options.batch.empty()) error = "option --atomic needs --batch";
+    if (!options.batch.empty() && (options.help || options.version || options.listCommands)) {
+        error = "option --batch cannot be combined with --help, --version or --list-commands";
+    }
+    if (!options.batch.empty() && !rest.empty()) {
+        error = "option --batch takes its command lines from the batch; '" +
+                Zorbel::Format::TerminalSafe(rest.front()) + "' cannot follow it";
+    }
+    if (!error.empty()) {
+        std::cerr << "Error: " << error
+                  << "\nUsage: hadrocli [global options] --batch FILE|-; see 'hadrocli --help'.\n";
+        return Zorbel::AutoCli::EXIT_REFUSED;
+    }
+
     auto dispatcher = Dispatcher::New("hadrocli");
     dispatcher->LoadPluginDirectories(PluginDirectories(options), std::cerr);
+    if (!options.batch.empty()) return RunBatch(*dispatcher, options);
 
     auto prepared = dispatcher->Prepare(rest, options, std::cout, std::cerr);
     if (!prepared.ready) return prepared.status;

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 #include <fstream>
 #include <iostream>
@@ -17,6 +18,7 @@
 #include "core/section.h"
 #include "core/store.h"
 #include "core/text.h"
+#include "generate.h"
 #include "hostctl/session.h"
 #include "model/faults.h"
 #include "model/journal.h"
@@ -39,6 +41,11 @@ const char* const kUsageText =
     "  reset                          write the default host\n"
     "  export                         print the state document\n"
     "  import FILE|-                  replace the state document (checked first)\n"
+    "  generate --scale N             replace the state by a large host built on the default\n"
+    "                                 one: at scale 1, 256 interfaces, 64 more switches with\n"
+    "                                 1,024 port groups, 16 distributed switches with 4,096\n"
+    "                                 ports, 1,000 VMs, 200 rulesets, 10,000 connections,\n"
+    "                                 5,000 neighbours, 2,000 routes (N from 0.01 to 16)\n"
     "  fault add OPERATION [--target NAME] [--message TEXT] [--count N]\n"
     "                                 make calls of OPERATION fail (on target NAME only,\n"
     "                                 with TEXT, N times; default: every time, with\n"
@@ -90,6 +97,27 @@ std::uint32_t ParseCount(const std::string& text) {
         throw UsageError{"--count must be a whole number from 1 to 4294967295, not '" + text + "'"};
     }
     return static_cast<std::uint32_t>(value);
+}
+
+double ParseScale(const std::vector<std::string>& args) {
+    std::string text;
+    for (std::size_t i = 0; i < args.size(); ++i) {
+        if (auto value = OptionValue(args, i, "--scale")) {
+            if (!text.empty()) throw UsageError{"'generate' takes --scale once"};
+            text = *value;
+        } else {
+            throw UsageError{"'generate' takes --scale N, not '" + args[i] + "'"};
+        }
+    }
+    if (text.empty()) throw UsageError{"'generate' needs --scale N"};
+    char* end = nullptr;
+    errno = 0;
+    double scale = std::strtod(text.c_str(), &end);
+    if (errno != 0 || end == text.c_str() || *end != '\0' || !(scale >= Hadro::Sim::kMinScale) ||
+        !(scale <= Hadro::Sim::kMaxScale)) {
+        throw UsageError{"--scale must be a number from 0.01 to 16, not '" + text + "'"};
+    }
+    return scale;
 }
 
 void ExpectArguments(const std::vector<std::string>& words, std::size_t count, const std::string& command) {
@@ -170,11 +198,12 @@ int Run(const std::vector<std::string>& args) {
     // Work out what to do before the state is touched, so that a refused command line
     // leaves the state alone.
     const std::string& command = words[0];
-    enum class Action { kReset, kExport, kImport, kFaultAdd, kFaultList, kFaultClear, kJournal };
+    enum class Action { kReset, kExport, kImport, kGenerate, kFaultAdd, kFaultList, kFaultClear, kJournal };
     Action action;
     TknCtl::Model::Fault fault;
     std::string journalVerb;
     std::string importSource;
+    double scale = 1;
     if (command == "reset") {
         ExpectArguments(words, 1, command);
         action = Action::kReset;
@@ -185,6 +214,9 @@ int Run(const std::vector<std::string>& args) {
         if (words.size() != 2) throw UsageError{"'import' takes one FILE (or - for standard input)"};
         importSource = words[1];
         action = Action::kImport;
+    } else if (command == "generate") {
+        scale = ParseScale(std::vector<std::string>(words.begin() + 1, words.end()));
+        action = Action::kGenerate;
     } else if (command == "fault") {
         if (words.size() < 2) throw UsageError{"'fault' needs add, list or clear"};
         if (words[1] == "add") {
@@ -217,7 +249,9 @@ int Run(const std::vector<std::string>& args) {
     }
 
     std::string path = HostCtl::Lib::ResolveStatePath(statePath);
-    bool replaces = action == Action::kReset || action == Action::kImport;
+    std::string generated;
+    if (action == Action::kGenerate) generated = Hadro::Sim::GenerateHost(scale);
+    bool replaces = action == Action::kReset || action == Action::kImport || action == Action::kGenerate;
     auto session = HostSession::OpenFile(
         path, replaces ? HostSession::OpenMode::kReplace : HostSession::OpenMode::kRead);
     // hadrosim checks the whole document, not only the sections it touches: it is the tool
@@ -237,6 +271,9 @@ int Run(const std::vector<std::string>& args) {
             break;
         case Action::kImport:
             session->Replace(importText, "import " + importSource);
+            break;
+        case Action::kGenerate:
+            session->Replace(generated, "the generated host");
             break;
         case Action::kFaultAdd:
             Write<FaultsSection>().faults.push_back(fault);

@@ -96,6 +96,15 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
                 return false;
             }
             options.formatParameters.emplace_back(value.substr(0, eq), value.substr(eq + 1));
+        } else if (TakeGlobalValue(args, i, "batch", value, error)) {
+            if (!error.empty()) return false;
+            if (value.empty()) {
+                error = "option --batch needs a file name (or - for standard input)";
+                return false;
+            }
+            options.batch = value;
+        } else if (arg == "--atomic") {
+            options.atomic = true;
         } else if (arg == "--list-commands") {
             options.listCommands = true;
         } else if (arg == "--help" || arg == "-h") {

@@ -234,6 +234,9 @@ std::string ProgramUsage(const std::string& program, NamespaceNode& root) {
         {"--plugin-dir=DIR",
          "Load plug-ins from DIR (default: $HADRO_PLUGIN_PATH, else the installed ones)."},
         {"--list-commands", "List every command with its description."},
+        {"--batch=FILE",
+         "Run the command lines of FILE (- for standard input), one per line, in one session."},
+        {"--atomic", "With --batch: every line must succeed, else nothing is changed."},
         {"--help, -h", "Show this help; after a namespace or command, its help."},
         {"--version", "Show the version."},
     });

@@ -65,6 +65,8 @@ public:
     // makes the current state the committed one). Throws StateFileError on failure; the
     // old file then stays as it was.
     void Commit();
+    // Forgets every change made since the session was opened or last committed.
+    void Rollback();
     // True when Commit would write.
     bool HasChanges() const;
     // The current document as JSON text.

@@ -333,6 +333,10 @@ void HostSession::Commit() {
     impl_->store->Committed(std::move(snapshot));
 }
 
+void HostSession::Rollback() {
+    impl_->store->Discard();
+}
+
 bool HostSession::HasChanges() const {
     return impl_->mustWrite || impl_->store->HasChanges();
 }

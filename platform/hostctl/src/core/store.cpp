@@ -226,8 +226,7 @@ SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
     if (!slot) throw HostCtl::Lib::HostCtlException(std::string("unknown section kind ") + kind.Name());
     if (!slot->data) {
         try {
-            slot->data =
-                slot->present ? kind.Parse(text_.substr(slot->begin, slot->end - slot->begin)) : kind.Empty();
+            slot->data = slot->present ? kind.Parse(Raw(*slot)) : kind.Empty();
         } catch (const SectionFault& fault) {
             Refuse(fault.what());
         }
@@ -306,6 +305,14 @@ void Store::Committed(Snapshot snapshot) {
         slots_[i].committed = std::make_unique<std::string>(std::move(*snapshot.serialized[i]));
         slots_[i].present = true;
         slots_[i].dirty = false;
+    }
+}
+
+void Store::Discard() {
+    for (auto& slot : slots_) {
+        if (!slot.dirty) continue;
+        slot.data.reset();
+        slot.dirty = false;
     }
 }
 

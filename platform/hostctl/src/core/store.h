@@ -58,6 +58,9 @@ public:
     Snapshot TakeSnapshot() const;
     // After a snapshot was written: its re-serialised sections are the document's now.
     void Committed(Snapshot snapshot);
+    // Drops every change since the text was read or last committed: sections are parsed
+    // again from their committed text when next used.
+    void Discard();
     // The document with the current content of every section.
     std::string Export() const;
     // Makes text (an export of this store) the new base text; nothing is changed after it.

@@ -30,6 +30,8 @@ struct GlobalOptions {
     bool listCommands = false;
     bool help = false;
     bool version = false;
+    std::string batch;    // --batch FILE ("-": standard input); empty: not given
+    bool atomic = false;  // --atomic: the whole batch is one transaction
     std::vector<std::pair<std::string, std::string>> formatParameters;
 };
 

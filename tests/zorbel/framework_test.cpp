@@ -173,7 +173,7 @@ TEST(CommandLine, PathsNamespacesAndGlobalOptions) {
 
     r = Cli({"--formatter=xmlish", "test"});
     EXPECT_EQ(r.status, EXIT_REFUSED);
-    EXPECT_EQ(r.err, "unknown formatter 'xmlish' for --formatter (choose from simple, table, json)");
+    EXPECT_EQ(r.err, "unknown formatter 'xmlish' for --formatter (choose from simple, table, json, xml, csv, keyvalue)");
     EXPECT_EQ(Cli({"--state"}).status, EXIT_REFUSED);
     EXPECT_EQ(Cli({"--what"}).err, "unknown global option --what");
 

@@ -8,7 +8,9 @@
 #include <exception>
 #include <ostream>
 
+#include "completion.h"
 #include "help.h"
+#include "manual.h"
 #include "options.h"
 #include "zorbel/formatter.h"
 
@@ -95,7 +97,9 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
                 error = "option --format-param needs KEY=VALUE, got '" + Options::Shown(value) + "'";
                 return false;
             }
-            options.formatParameters.emplace_back(value.substr(0, eq), value.substr(eq + 1));
+            std::string key = value.substr(0, eq), setting = value.substr(eq + 1);
+            if (error = Format::CheckFormatParameter(key, setting); !error.empty()) return false;
+            options.formatParameters.emplace_back(key, setting);
         } else if (TakeGlobalValue(args, i, "batch", value, error)) {
             if (!error.empty()) return false;
             if (value.empty()) {
@@ -105,6 +109,23 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
             options.batch = value;
         } else if (arg == "--atomic") {
             options.atomic = true;
+        } else if (arg == "--manual") {
+            options.manual = "man";
+        } else if (StartsWith(arg, "--manual=")) {
+            options.manual = arg.substr(9);
+            if (options.manual != "man" && options.manual != "markdown") {
+                error = "unknown manual format '" + Options::Shown(options.manual) +
+                        "' for --manual (choose from man, markdown)";
+                return false;
+            }
+        } else if (TakeGlobalValue(args, i, "completion", value, error)) {
+            if (!error.empty()) return false;
+            if (value != "bash" && value != "zsh") {
+                error =
+                    "unknown shell '" + Options::Shown(value) + "' for --completion (choose from bash, zsh)";
+                return false;
+            }
+            options.completion = value;
         } else if (arg == "--list-commands") {
             options.listCommands = true;
         } else if (arg == "--help" || arg == "-h") {
@@ -147,8 +168,8 @@ int Dispatcher::LoadPluginDirectories(const std::vector<std::string>& dirs, std:
             if (LoadPlugin(path, error)) {
                 ++loaded;
             } else {
-                err << "Warning: plug-in " << Format::TerminalSafe(path) << " not loaded: " << Format::TerminalSafeLines(error)
-                    << '\n';
+                err << "Warning: plug-in " << Format::TerminalSafe(path)
+                    << " not loaded: " << Format::TerminalSafeLines(error) << '\n';
             }
         }
     }
@@ -244,6 +265,15 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         WriteCommandList(options, out);
         return result;
     }
+    if (!options.manual.empty()) {
+        out << (options.manual == "markdown" ? Manual::Reference(programName_, *root_)
+                                             : Manual::ManPage(programName_, *root_));
+        return result;
+    }
+    if (!options.completion.empty()) {
+        out << Completion::Script(options.completion, programName_, *root_);
+        return result;
+    }
 
     // Words down the tree until a command, an option or the end.
     std::shared_ptr<NamespaceNode> node = root_;
@@ -254,8 +284,8 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         auto child = node->GetNamespaceNode(word);
         if (!child) {
             std::string where = node == root_ ? programName_ : node->GetPathString(' ');
-            err << "Error: Unknown command or namespace '" << Options::Shown(word) << "' in '" << where << "'. "
-                << Help::ValidChoices(*node) << '\n';
+            err << "Error: Unknown command or namespace '" << Options::Shown(word) << "' in '" << where
+                << "'. " << Help::ValidChoices(*node) << '\n';
             err << Help::UsageHint(programName_, node == root_ ? "" : node->GetPathString(' '));
             result.status = EXIT_REFUSED;
             return result;
@@ -282,7 +312,8 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         }
         if (!rest.empty()) {
             err << "Error: '" << (node == root_ ? programName_ : node->GetPathString(' '))
-                << "' is a namespace, not a command; " << Options::Shown(rest.front()) << " is not valid here.\n";
+                << "' is a namespace, not a command; " << Options::Shown(rest.front())
+                << " is not valid here.\n";
         }
         err << (node == root_ ? Help::ProgramUsage(programName_, *node)
                               : Help::NamespaceText(programName_, *node));
@@ -317,6 +348,18 @@ Prepared Dispatcher::Prepare(const std::vector<std::string>& args, const GlobalO
         result.status = EXIT_REFUSED;
         return result;
     }
+    if (!options.formatParameters.empty()) {
+        // Fields chosen with --format-param must be fields of the result.
+        auto outputSpec = command->GetOutputSpec();
+        error = Format::CheckFields(Format::OutputParameters(options.formatParameters),
+                                    outputSpec ? outputSpec->GetRootObject().get() : nullptr);
+        if (!error.empty()) {
+            err << "Error: " << error << '\n';
+            err << Help::UsageHint(programName_, path);
+            result.status = EXIT_REFUSED;
+            return result;
+        }
+    }
     result.ready = true;
     result.invocation = Invocation{command, path, inputSpec, input};
     return result;
@@ -344,8 +387,8 @@ int Dispatcher::Execute(const Invocation& invocation, const GlobalOptions& optio
             Format::Render(formatter, *root, parameters, rendered);
         }
     } catch (const std::exception& e) {
-        err << "Error: unexpected failure in '" << invocation.path << "': " << Format::TerminalSafeLines(e.what())
-            << '\n';
+        err << "Error: unexpected failure in '" << invocation.path
+            << "': " << Format::TerminalSafeLines(e.what()) << '\n';
         return EXIT_UNEXPECTED;
     } catch (...) {
         err << "Error: unexpected failure in '" << invocation.path << "'\n";

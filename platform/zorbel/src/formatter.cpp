@@ -1,7 +1,10 @@
 #include "zorbel/formatter.h"
 
 #include <algorithm>
+#include <cctype>
 #include <cstdlib>
+#include <iterator>
+#include <string>
 #include <string_view>
 
 namespace Zorbel::Format {
@@ -31,7 +34,7 @@ std::optional<std::string> OutputParameters::Get(const std::string& key) const {
 }
 
 const std::vector<std::string>& FormatterNames() {
-    static const std::vector<std::string> names{"simple", "table", "json"};
+    static const std::vector<std::string> names{"simple", "table", "json", "xml", "csv", "keyvalue"};
     return names;
 }
 
@@ -150,7 +153,10 @@ void AppendJson(std::string& out, const MetaObject* value) {
 // Display rules of one rendering: which fields of a record, its heading, the units.
 class Layout {
 public:
-    Layout(const OutputParameters& parameters, bool table) : parameters_(parameters), table_(table) {}
+    // raw: text is kept as it is (the formatter escapes it its own way) rather than made safe
+    // for a terminal.
+    Layout(const OutputParameters& parameters, bool table, bool raw = false)
+        : parameters_(parameters), table_(table), raw_(raw) {}
 
     // The fields of record to show, in order. A named field the record lacks is skipped.
     std::vector<const MetaStruct::Field*> ShownFields(const MetaStruct& record) const {
@@ -238,7 +244,8 @@ public:
         if (!value) return {};
         switch (value->GetType()) {
             case MetaObj::META_STRING:
-                return Display(static_cast<const MetaString*>(value)->Get());
+                return raw_ ? static_cast<const MetaString*>(value)->Get()
+                            : Display(static_cast<const MetaString*>(value)->Get());
             case MetaObj::META_INT:
                 return std::to_string(static_cast<const MetaInt*>(value)->Get());
             case MetaObj::META_BOOL:
@@ -262,8 +269,9 @@ public:
                 for (const auto* field : ShownFields(*record)) {
                     if (!first) text += ", ";
                     first = false;
-                    text +=
-                        field->first + ": " + Scalar(field->second.get(), record->GetName(), field->first);
+                    text += field->first + ": " +
+                            (raw_ ? Plain(field->second.get())
+                                  : Scalar(field->second.get(), record->GetName(), field->first));
                 }
                 return text;
             }
@@ -279,7 +287,13 @@ public:
 private:
     const OutputParameters& parameters_;
     bool table_;
+    bool raw_;
 };
+
+// "show-header" (checked and made "true" or "false" when the user gave it).
+bool ShowHeader(const OutputParameters& parameters) {
+    return parameters.Get("show-header").value_or("true") != "false";
+}
 
 bool IsRecordList(const MetaObject* value) {
     return value && value->GetType() == MetaObj::META_LIST &&
@@ -433,9 +447,10 @@ private:
             rows.push_back(std::move(row));
         }
 
+        const bool header = ShowHeader(layout_.parameters());
         std::vector<std::size_t> widths(columns.size());
         for (std::size_t i = 0; i < columns.size(); ++i) {
-            widths[i] = DisplayWidth(columns[i]);
+            widths[i] = header ? DisplayWidth(columns[i]) : 0;
             for (const auto& row : rows)
                 widths[i] = std::max(widths[i], DisplayWidth(row[i]));
         }
@@ -450,15 +465,17 @@ private:
             std::size_t room = total > lastStart ? total - lastStart : 0;
             room = std::max<std::size_t>(room, 10);
             lastWidth = std::min(lastWidth, room);
-            lastWidth = std::max(lastWidth, DisplayWidth(columns.back()));
+            if (header) lastWidth = std::max(lastWidth, DisplayWidth(columns.back()));
         }
 
         std::vector<std::string> dashes;
         for (std::size_t i = 0; i < columns.size(); ++i) {
             dashes.emplace_back(i + 1 == columns.size() ? lastWidth : widths[i], '-');
         }
-        Row(columns, widths, lastStart, lastWidth, false);
-        Row(dashes, widths, lastStart, lastWidth, false);
+        if (header) {
+            Row(columns, widths, lastStart, lastWidth, false);
+            Row(dashes, widths, lastStart, lastWidth, false);
+        }
         for (const auto& row : rows)
             Row(row, widths, lastStart, lastWidth, wrapLast);
     }
@@ -489,6 +506,515 @@ private:
     Layout layout_;
     std::string& out_;
 };
+
+// ---------------------------------------------------------------- the user's "fields"
+
+std::vector<std::string> SplitList(const std::string& list) {
+    std::vector<std::string> names;
+    std::size_t start = 0;
+    while (start <= list.size()) {
+        std::size_t comma = list.find(',', start);
+        if (comma == std::string::npos) comma = list.size();
+        names.push_back(list.substr(start, comma - start));
+        start = comma + 1;
+    }
+    return names;
+}
+
+// The fields of a record the machine formats (json, xml, keyvalue) show: the chosen ones in
+// their order, else every field.
+std::vector<const MetaStruct::Field*> FieldsOf(const MetaStruct& record,
+                                               const std::vector<std::string>* chosen) {
+    std::vector<const MetaStruct::Field*> shown;
+    const auto& fields = record.GetFields();
+    if (!chosen) {
+        for (const auto& field : fields)
+            shown.push_back(&field);
+        return shown;
+    }
+    for (const auto& name : *chosen) {
+        for (const auto& field : fields) {
+            if (field.first == name) {
+                shown.push_back(&field);
+                break;
+            }
+        }
+    }
+    return shown;
+}
+
+// The record a result is made of: the root record, or the records of a root list (the first
+// one, else the list's prototype).
+const MetaStruct* ResultRecord(const MetaObject* root) {
+    if (!root) return nullptr;
+    if (root->GetType() == MetaObj::META_STRUCT) return static_cast<const MetaStruct*>(root);
+    if (!IsRecordList(root)) return nullptr;
+    const auto* list = static_cast<const MetaList*>(root);
+    for (const auto& item : list->GetItems()) {
+        if (item && item->GetType() == MetaObj::META_STRUCT)
+            return static_cast<const MetaStruct*>(item.get());
+    }
+    return list->GetPrototype().get();
+}
+
+// JSON of the result with the chosen fields of its own records.
+void AppendJsonResult(std::string& out, const MetaObject& root, const std::vector<std::string>* chosen) {
+    auto record = [&](const MetaStruct& value) {
+        out += '{';
+        bool first = true;
+        for (const auto* field : FieldsOf(value, chosen)) {
+            if (!first) out += ',';
+            first = false;
+            AppendJsonString(out, field->first);
+            out += ':';
+            AppendJson(out, field->second.get());
+        }
+        out += '}';
+    };
+    if (chosen && root.GetType() == MetaObj::META_STRUCT) {
+        record(static_cast<const MetaStruct&>(root));
+    } else if (chosen && IsRecordList(&root)) {
+        out += '[';
+        bool first = true;
+        for (const auto& item : static_cast<const MetaList&>(root).GetItems()) {
+            if (!first) out += ',';
+            first = false;
+            if (item && item->GetType() == MetaObj::META_STRUCT) {
+                record(static_cast<const MetaStruct&>(*item));
+            } else {
+                AppendJson(out, item.get());
+            }
+        }
+        out += ']';
+    } else {
+        AppendJson(out, &root);
+    }
+    out += '\n';
+}
+
+// ---------------------------------------------------------------- xml
+
+// Text as XML character data or attribute value. Markup characters become entities; tab,
+// line feed and carriage return character references (so that they survive attribute
+// normalisation); DEL and the C1 controls references too, so that the raw byte never reaches
+// a terminal. The other C0 controls, U+FFFE, U+FFFF and bytes that are not UTF-8 cannot stand
+// in an XML 1.0 document in any form: each becomes U+FFFD.
+void AppendXmlText(std::string& out, const std::string& text) {
+    static const char hex[] = "0123456789ABCDEF";
+    static const char replacement[] = "\xEF\xBF\xBD";
+    const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
+    std::size_t i = 0;
+    while (i < text.size()) {
+        unsigned char c = bytes[i];
+        if (c < 0x80) {
+            switch (c) {
+                case '&':
+                    out += "&amp;";
+                    break;
+                case '<':
+                    out += "&lt;";
+                    break;
+                case '>':
+                    out += "&gt;";
+                    break;
+                case '"':
+                    out += "&quot;";
+                    break;
+                case '\'':
+                    out += "&apos;";
+                    break;
+                case '\t':
+                    out += "&#9;";
+                    break;
+                case '\n':
+                    out += "&#10;";
+                    break;
+                case '\r':
+                    out += "&#13;";
+                    break;
+                default:
+                    if (c == 0x7f) {
+                        out += "&#x7F;";
+                    } else if (c < 0x20) {
+                        out += replacement;
+                    } else {
+                        out += static_cast<char>(c);
+                    }
+            }
+            ++i;
+            continue;
+        }
+        std::size_t length = Utf8SequenceLength(bytes + i, text.size() - i);
+        if (length == 0) {
+            out += replacement;
+            ++i;
+            continue;
+        }
+        if (length == 2 && c == 0xC2 && bytes[i + 1] <= 0x9F) {
+            out += "&#x";
+            out += hex[bytes[i + 1] >> 4];
+            out += hex[bytes[i + 1] & 0xf];
+            out += ';';
+        } else if (length == 3 && c == 0xEF && bytes[i + 1] == 0xBF && bytes[i + 2] >= 0xBE) {
+            out += replacement;
+        } else {
+            out.append(text, i, length);
+        }
+        i += length;
+    }
+}
+
+class XmlWriter {
+public:
+    XmlWriter(const std::vector<std::string>* chosen, std::string& out) : chosen_(chosen), out_(out) {}
+
+    void Root(const MetaObject& root) {
+        out_ += "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<output>\n";
+        Value(&root, 1, true);
+        out_ += "</output>\n";
+    }
+
+private:
+    void Indent(std::size_t level) { out_.append(2 * level, ' '); }
+
+    // A scalar on one line: <string>text</string>.
+    static bool Inline(const MetaObject* value) {
+        return !value || (value->GetType() != MetaObj::META_STRUCT && value->GetType() != MetaObj::META_LIST);
+    }
+
+    void Scalar(const MetaObject* value) {
+        if (!value) {
+            out_ += "<none/>";
+            return;
+        }
+        switch (value->GetType()) {
+            case MetaObj::META_STRING:
+                out_ += "<string>";
+                AppendXmlText(out_, static_cast<const MetaString*>(value)->Get());
+                out_ += "</string>";
+                break;
+            case MetaObj::META_INT:
+                out_ +=
+                    "<integer>" + std::to_string(static_cast<const MetaInt*>(value)->Get()) + "</integer>";
+                break;
+            case MetaObj::META_BOOL:
+                out_ += static_cast<const MetaBool*>(value)->Get() ? "<boolean>true</boolean>"
+                                                                   : "<boolean>false</boolean>";
+                break;
+            default:
+                break;
+        }
+    }
+
+    // A value on lines of its own at the given level. top: the result itself, whose records
+    // show the chosen fields.
+    void Value(const MetaObject* value, std::size_t level, bool top) {
+        Indent(level);
+        if (Inline(value)) {
+            Scalar(value);
+            out_ += '\n';
+            return;
+        }
+        if (value->GetType() == MetaObj::META_LIST) {
+            const auto& items = static_cast<const MetaList*>(value)->GetItems();
+            if (items.empty()) {
+                out_ += "<list/>\n";
+                return;
+            }
+            out_ += "<list>\n";
+            for (const auto& item : items)
+                Value(item.get(), level + 1, top);
+            Indent(level);
+            out_ += "</list>\n";
+            return;
+        }
+        const auto& record = static_cast<const MetaStruct&>(*value);
+        out_ += "<record name=\"";
+        AppendXmlText(out_, record.GetName());
+        out_ += "\">\n";
+        for (const auto* field : FieldsOf(record, top ? chosen_ : nullptr)) {
+            Indent(level + 1);
+            out_ += "<field name=\"";
+            AppendXmlText(out_, field->first);
+            out_ += "\">";
+            if (Inline(field->second.get())) {
+                Scalar(field->second.get());
+            } else {
+                out_ += '\n';
+                Value(field->second.get(), level + 2, false);
+                Indent(level + 1);
+            }
+            out_ += "</field>\n";
+        }
+        Indent(level);
+        out_ += "</record>\n";
+    }
+
+    const std::vector<std::string>* chosen_;
+    std::string& out_;
+};
+
+// ---------------------------------------------------------------- csv
+
+// One CSV field: quoted when it holds a comma, a quote, a line break or a leading or trailing
+// blank, quotes doubled. Control characters other than tab and line breaks, and bytes that
+// are not UTF-8, become U+FFFD: CSV has no escapes, and the raw bytes could drive a terminal.
+void AppendCsvField(std::string& out, const std::string& text) {
+    std::string clean;
+    clean.reserve(text.size());
+    const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
+    std::size_t i = 0;
+    while (i < text.size()) {
+        unsigned char c = bytes[i];
+        if (c < 0x80) {
+            if ((c < 0x20 && c != '\t' && c != '\n' && c != '\r') || c == 0x7f) {
+                clean += "\xEF\xBF\xBD";
+            } else {
+                clean += static_cast<char>(c);
+            }
+            ++i;
+            continue;
+        }
+        std::size_t length = Utf8SequenceLength(bytes + i, text.size() - i);
+        if (length == 0 || (length == 2 && c == 0xC2 && bytes[i + 1] <= 0x9F)) {
+            clean += "\xEF\xBF\xBD";
+            i += length == 0 ? 1 : length;
+            continue;
+        }
+        clean.append(text, i, length);
+        i += length;
+    }
+    bool quote = clean.find_first_of(",\"\r\n") != std::string::npos ||
+                 (!clean.empty() && (clean.front() == ' ' || clean.back() == ' '));
+    if (!quote) {
+        out += clean;
+        return;
+    }
+    out += '"';
+    for (char c : clean) {
+        if (c == '"') out += '"';
+        out += c;
+    }
+    out += '"';
+}
+
+class CsvWriter {
+public:
+    CsvWriter(const OutputParameters& parameters, std::string& out)
+        : layout_(parameters, true, true), out_(out) {}
+
+    void Root(const MetaObject& root) {
+        if (root.GetType() == MetaObj::META_STRUCT) {
+            Table({static_cast<const MetaStruct*>(&root)}, static_cast<const MetaStruct*>(&root));
+            return;
+        }
+        if (IsRecordList(&root)) {
+            std::vector<const MetaStruct*> records;
+            for (const auto& item : static_cast<const MetaList&>(root).GetItems()) {
+                if (item && item->GetType() == MetaObj::META_STRUCT)
+                    records.push_back(static_cast<const MetaStruct*>(item.get()));
+            }
+            Table(records, ResultRecord(&root));
+            return;
+        }
+        if (root.GetType() == MetaObj::META_LIST) {
+            for (const auto& item : static_cast<const MetaList&>(root).GetItems())
+                Line({layout_.Plain(item.get())});
+            return;
+        }
+        Line({layout_.Plain(&root)});
+    }
+
+private:
+    // The columns are those of the first record (of the prototype when the list is empty, so
+    // that an empty result still has its header); a later record's cell is looked up by name.
+    void Table(const std::vector<const MetaStruct*>& records, const MetaStruct* shape) {
+        if (!shape) return;
+        std::vector<std::string> columns;
+        for (const auto* field : layout_.ShownFields(*shape))
+            columns.push_back(field->first);
+        if (columns.empty()) return;
+        if (ShowHeader(layout_.parameters())) Line(columns);
+        for (const auto* record : records) {
+            std::vector<std::string> cells;
+            for (const auto& column : columns) {
+                auto value = record->GetField(column);
+                cells.push_back(value ? layout_.Plain(value.get()) : std::string());
+            }
+            Line(cells);
+        }
+    }
+
+    // One record, ended by CRLF.
+    void Line(const std::vector<std::string>& cells) {
+        for (std::size_t i = 0; i < cells.size(); ++i) {
+            if (i) out_ += ',';
+            AppendCsvField(out_, cells[i]);
+        }
+        out_ += "\r\n";
+    }
+
+    Layout layout_;
+    std::string& out_;
+};
+
+// ---------------------------------------------------------------- keyvalue
+
+// A value on a keyvalue line: backslash, line breaks, tab and every other control character
+// or byte that is not UTF-8 written as escapes (\\, \n, \r, \t, \xNN), so that each value
+// stays on its line and `printf '%b'` gives the exact bytes back.
+void AppendKeyValueText(std::string& out, const std::string& text) {
+    static const char hex[] = "0123456789abcdef";
+    auto escape = [&](unsigned char c) {
+        out += "\\x";
+        out += hex[c >> 4];
+        out += hex[c & 0xf];
+    };
+    const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
+    std::size_t i = 0;
+    while (i < text.size()) {
+        unsigned char c = bytes[i];
+        if (c < 0x80) {
+            switch (c) {
+                case '\\':
+                    out += "\\\\";
+                    break;
+                case '\n':
+                    out += "\\n";
+                    break;
+                case '\r':
+                    out += "\\r";
+                    break;
+                case '\t':
+                    out += "\\t";
+                    break;
+                default:
+                    if (c < 0x20 || c == 0x7f) {
+                        escape(c);
+                    } else {
+                        out += static_cast<char>(c);
+                    }
+            }
+            ++i;
+            continue;
+        }
+        std::size_t length = Utf8SequenceLength(bytes + i, text.size() - i);
+        if (length == 0) {
+            escape(c);
+            ++i;
+        } else if (length == 2 && c == 0xC2 && bytes[i + 1] <= 0x9F) {
+            escape(c);
+            escape(bytes[i + 1]);
+            i += 2;
+        } else {
+            out.append(text, i, length);
+            i += length;
+        }
+    }
+}
+
+class KeyValueWriter {
+public:
+    KeyValueWriter(const std::vector<std::string>* chosen, std::string& out) : chosen_(chosen), out_(out) {}
+
+    void Root(const MetaObject& root) {
+        if (root.GetType() == MetaObj::META_STRUCT) {
+            const auto& record = static_cast<const MetaStruct&>(root);
+            Record(record, KeyText(record.GetName()), chosen_);
+        } else if (root.GetType() == MetaObj::META_LIST) {
+            // Records of a list are separated by a blank line.
+            bool first = true;
+            for (const auto& item : static_cast<const MetaList&>(root).GetItems()) {
+                if (item && item->GetType() == MetaObj::META_STRUCT) {
+                    if (!first) out_ += '\n';
+                    first = false;
+                    const auto& record = static_cast<const MetaStruct&>(*item);
+                    Record(record, KeyText(record.GetName()), chosen_);
+                } else {
+                    Scalar(item.get());
+                    out_ += '\n';
+                }
+            }
+        } else {
+            Scalar(&root);
+            out_ += '\n';
+        }
+    }
+
+private:
+    // Names in keys are escaped too, and '=' in them as well: the first '=' ends the key.
+    static std::string KeyText(const std::string& name) {
+        std::string key;
+        AppendKeyValueText(key, name);
+        std::string out;
+        for (char c : key) {
+            if (c == '=') {
+                out += "\\x3d";
+            } else {
+                out += c;
+            }
+        }
+        return out;
+    }
+
+    void Scalar(const MetaObject* value) {
+        if (!value) return;
+        switch (value->GetType()) {
+            case MetaObj::META_STRING:
+                AppendKeyValueText(out_, static_cast<const MetaString*>(value)->Get());
+                break;
+            case MetaObj::META_INT:
+                out_ += std::to_string(static_cast<const MetaInt*>(value)->Get());
+                break;
+            case MetaObj::META_BOOL:
+                out_ += static_cast<const MetaBool*>(value)->Get() ? "true" : "false";
+                break;
+            default:
+                break;
+        }
+    }
+
+    // Every field as PREFIX.Field=value; nested records extend the prefix, and a list gives
+    // one line (or one group of lines) per element.
+    void Record(const MetaStruct& record, const std::string& prefix, const std::vector<std::string>* chosen) {
+        for (const auto* field : FieldsOf(record, chosen))
+            Field(field->second.get(), prefix + "." + KeyText(field->first));
+    }
+
+    void Field(const MetaObject* value, const std::string& key) {
+        if (!value) return;
+        if (value->GetType() == MetaObj::META_STRUCT) {
+            Record(static_cast<const MetaStruct&>(*value), key, nullptr);
+            return;
+        }
+        if (value->GetType() == MetaObj::META_LIST) {
+            for (const auto& item : static_cast<const MetaList*>(value)->GetItems())
+                Field(item.get(), key);
+            return;
+        }
+        out_ += key;
+        out_ += '=';
+        Scalar(value);
+        out_ += '\n';
+    }
+
+    const std::vector<std::string>* chosen_;
+    std::string& out_;
+};
+
+bool ParseBoolean(std::string text, bool& value) {
+    for (char& c : text)
+        c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+    if (text == "true" || text == "yes" || text == "on" || text == "1") {
+        value = true;
+        return true;
+    }
+    if (text == "false" || text == "no" || text == "off" || text == "0") {
+        value = false;
+        return true;
+    }
+    return false;
+}
 
 }  // namespace
 
@@ -579,9 +1105,15 @@ std::string TerminalSafe(const std::string& text) {
         unsigned char c = bytes[i];
         if (c < 0x80) {
             switch (c) {
-                case '\t': out += "\\t"; break;
-                case '\n': out += "\\n"; break;
-                case '\r': out += "\\r"; break;
+                case '\t':
+                    out += "\\t";
+                    break;
+                case '\n':
+                    out += "\\n";
+                    break;
+                case '\r':
+                    out += "\\r";
+                    break;
                 default:
                     if (c < 0x20 || c == 0x7f) {
                         escape(out, c, false);
@@ -621,15 +1153,83 @@ std::string TerminalSafeLines(const std::string& text) {
     return out;
 }
 
+std::string CheckFormatParameter(const std::string& key, std::string& value) {
+    static const char* const bare[] = {"fields", "show-header", "table-columns", "wrap-last"};
+    static const char* const prefixed[] = {"fields:", "header:", "units:", "table-columns:"};
+    bool known = std::find_if(std::begin(bare), std::end(bare), [&](const char* k) { return key == k; }) !=
+                 std::end(bare);
+    for (const char* prefix : prefixed) {
+        std::size_t length = std::char_traits<char>::length(prefix);
+        if (key.size() > length && key.compare(0, length, prefix) == 0) known = true;
+    }
+    if (!known) {
+        return "unknown display parameter '" + TerminalSafe(key) +
+               "' for --format-param (choose from fields, show-header, table-columns, wrap-last, "
+               "fields:RECORD, header:RECORD, units:RECORD.FIELD, table-columns:RECORD)";
+    }
+    if (key == "show-header" || key == "wrap-last") {
+        bool flag = false;
+        if (!ParseBoolean(value, flag))
+            return "--format-param " + key + ": '" + TerminalSafe(value) +
+                   "' is not a boolean (true or false)";
+        value = flag ? "true" : "false";
+    }
+    if (key == "fields") {
+        for (const auto& name : SplitList(value)) {
+            if (name.empty())
+                return "--format-param fields: an empty field name in '" + TerminalSafe(value) + "'";
+        }
+    }
+    return {};
+}
+
+std::string CheckFields(const OutputParameters& parameters, const MetaObj::MetaObject* shape) {
+    auto list = parameters.Get("fields");
+    if (!list || !shape) return {};
+    const MetaStruct* record = ResultRecord(shape);
+    if (!record) return "--format-param fields: this command's result has no fields";
+    for (const auto& name : SplitList(*list)) {
+        if (!record->GetField(name)) {
+            std::string error = "--format-param fields: '" + TerminalSafe(name) + "' is not a field of " +
+                                record->GetName() + " (fields: ";
+            bool first = true;
+            for (const auto& field : record->GetFields()) {
+                error += (first ? "" : ", ") + field.first;
+                first = false;
+            }
+            return error + ")";
+        }
+    }
+    return {};
+}
+
 void Render(const std::string& formatter, const MetaObj::MetaObject& root, const OutputParameters& parameters,
             std::string& out) {
+    // The user's "fields" chooses the fields of the result's own records, before anything the
+    // command set for them.
+    OutputParameters effective = parameters;
+    std::vector<std::string> chosenFields;
+    const std::vector<std::string>* chosen = nullptr;
+    if (auto fields = parameters.Get("fields")) {
+        chosenFields = SplitList(*fields);
+        chosen = &chosenFields;
+        if (const MetaStruct* record = ResultRecord(&root)) {
+            effective.Set("fields:" + record->GetName(), *fields);
+            effective.Set("table-columns:" + record->GetName(), *fields);
+        }
+    }
     if (formatter == "json") {
-        AppendJson(out, &root);
-        out += '\n';
+        AppendJsonResult(out, root, chosen);
     } else if (formatter == "table") {
-        TableWriter(parameters, out).Root(root);
+        TableWriter(effective, out).Root(root);
+    } else if (formatter == "xml") {
+        XmlWriter(chosen, out).Root(root);
+    } else if (formatter == "csv") {
+        CsvWriter(effective, out).Root(root);
+    } else if (formatter == "keyvalue") {
+        KeyValueWriter(chosen, out).Root(root);
     } else {
-        SimpleWriter(parameters, out).Root(root);
+        SimpleWriter(effective, out).Root(root);
     }
 }
 

@@ -163,7 +163,7 @@ void AppendFieldsText(std::string& out, const MetaStruct& record, std::size_t in
     }
 }
 
-std::string OutputText(const CallSpec::OutputSpec* output) {
+std::string OutputTextOf(const CallSpec::OutputSpec* output) {
     const MetaObject* root = output ? output->GetRootObject().get() : nullptr;
     std::string out;
     if (!root) return "  none\n";
@@ -209,6 +209,10 @@ std::string ExpandDescription(const ParameterSpec& parameter) {
     return text;
 }
 
+std::string OutputText(const CallSpec::OutputSpec* output) {
+    return OutputTextOf(output);
+}
+
 std::string ValidChoices(NamespaceNode& node) {
     std::string text = "Valid choices: ";
     auto names = node.GetNamespaceNodeNames();
@@ -224,12 +228,14 @@ std::string UsageHint(const std::string& program, const std::string& path) {
            "; see '" + target + " --help'.\n";
 }
 
-std::string ProgramUsage(const std::string& program, NamespaceNode& root) {
-    std::string out = "Usage: " + program + " [global options] NAMESPACE... COMMAND [command options]\n\n";
-    out += "Global options:\n";
-    out += Listing({
+std::vector<std::pair<std::string, std::string>> GlobalOptionRows() {
+    return {
         {"--formatter=NAME",
-         "Output format: simple, table or json (default: the command's own, else simple)."},
+         "Output format: simple, table, json, xml, csv or keyvalue (default: the command's own, else "
+         "simple)."},
+        {"--format-param=KEY=VALUE",
+         "Display parameter, repeatable: fields=A,B (choose and order the fields), show-header=false "
+         "(table, csv)."},
         {"--state=PATH", "Host state file (default: $HADRO_STATE, else $XDG_STATE_HOME/hadro/host.json)."},
         {"--plugin-dir=DIR",
          "Load plug-ins from DIR (default: $HADRO_PLUGIN_PATH, else the installed ones)."},
@@ -237,9 +243,17 @@ std::string ProgramUsage(const std::string& program, NamespaceNode& root) {
         {"--batch=FILE",
          "Run the command lines of FILE (- for standard input), one per line, in one session."},
         {"--atomic", "With --batch: every line must succeed, else nothing is changed."},
+        {"--manual", "Write the manual page (troff) of every command."},
+        {"--completion=SHELL", "Write the completion script for bash or zsh."},
         {"--help, -h", "Show this help; after a namespace or command, its help."},
         {"--version", "Show the version."},
-    });
+    };
+}
+
+std::string ProgramUsage(const std::string& program, NamespaceNode& root) {
+    std::string out = "Usage: " + program + " [global options] NAMESPACE... COMMAND [command options]\n\n";
+    out += "Global options:\n";
+    out += Listing(GlobalOptionRows());
     out += "\nAvailable Namespaces:\n";
     out += Children(root, false);
     std::string commands = Children(root, true);
@@ -272,6 +286,30 @@ std::string NamespaceJson(NamespaceNode& node) {
     return out;
 }
 
+std::vector<std::string> ParameterNotes(const ParameterSpec& parameter) {
+    std::vector<std::string> notes;
+    if (parameter.IsRequired()) notes.push_back("required");
+    if (parameter.GetType() == CallSpec::PARAM_STRING_LIST) notes.push_back("may be repeated");
+    if (const auto& constraint = parameter.GetConstraint()) {
+        const bool listed = parameter.GetDescription().find("ENUM%") != std::string::npos;
+        switch (constraint->GetType()) {
+            case CallSpec::CONSTRAINT_INT_RANGE:
+                notes.push_back(RangeText(*constraint));
+                break;
+            case CallSpec::CONSTRAINT_INT_ENUM:
+            case CallSpec::CONSTRAINT_STRING_ENUM:
+                if (!listed) notes.push_back("one of: " + EnumValues(*constraint));
+                break;
+            case CallSpec::CONSTRAINT_STRING_REGEX:
+                notes.push_back("pattern: " + constraint->GetRegex());
+                break;
+            default:
+                break;
+        }
+    }
+    return notes;
+}
+
 std::string CommandText(const std::string& program, const std::string& path, const AutoCli::Command& command,
                         const CallSpec::InputSpec& input, const CallSpec::OutputSpec* output) {
     std::string out = "Usage: " + program + " " + path + " [cmd options]\n\n";
@@ -286,26 +324,7 @@ std::string CommandText(const std::string& program, const std::string& path, con
         if (parameter->GetType() != CallSpec::PARAM_FLAG) {
             head += "=<" + std::string(CallSpec::ParameterTypeName(parameter->GetType())) + ">";
         }
-        std::vector<std::string> notes;
-        if (parameter->IsRequired()) notes.push_back("required");
-        if (parameter->GetType() == CallSpec::PARAM_STRING_LIST) notes.push_back("may be repeated");
-        if (const auto& constraint = parameter->GetConstraint()) {
-            const bool listed = parameter->GetDescription().find("ENUM%") != std::string::npos;
-            switch (constraint->GetType()) {
-                case CallSpec::CONSTRAINT_INT_RANGE:
-                    notes.push_back(RangeText(*constraint));
-                    break;
-                case CallSpec::CONSTRAINT_INT_ENUM:
-                case CallSpec::CONSTRAINT_STRING_ENUM:
-                    if (!listed) notes.push_back("one of: " + EnumValues(*constraint));
-                    break;
-                case CallSpec::CONSTRAINT_STRING_REGEX:
-                    notes.push_back("pattern: " + constraint->GetRegex());
-                    break;
-                default:
-                    break;
-            }
-        }
+        std::vector<std::string> notes = ParameterNotes(*parameter);
         if (!notes.empty()) {
             head += "  (";
             for (std::size_t i = 0; i < notes.size(); ++i)
@@ -329,7 +348,7 @@ std::string CommandText(const std::string& program, const std::string& path, con
         }
     }
     out += "\nOutput:\n";
-    out += OutputText(output);
+    out += OutputTextOf(output);
     return out;
 }
 

@@ -2,6 +2,8 @@
 #pragma once
 
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "zorbel/autocli.h"
 
@@ -18,6 +20,13 @@ std::string CommandJson(const std::string& path, const AutoCli::Command& command
 std::string ValidChoices(AutoCli::NamespaceNode& node);
 // The line that follows a refusal.
 std::string UsageHint(const std::string& program, const std::string& path);
+// The global options and their one-line descriptions, as usage lists them.
+std::vector<std::pair<std::string, std::string>> GlobalOptionRows();
+// What the help says about a parameter besides its description: "required", "may be
+// repeated", its range, allowed values (when the description does not list them) or pattern.
+std::vector<std::string> ParameterNotes(const CallSpec::ParameterSpec& parameter);
+// The "Output:" part of a command's help: the result's kind and its record's fields.
+std::string OutputText(const CallSpec::OutputSpec* output);
 // A parameter description with "%ENUM%" and "%FULLENUM%" expanded.
 std::string ExpandDescription(const CallSpec::ParameterSpec& parameter);
 

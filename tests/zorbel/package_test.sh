@@ -20,11 +20,13 @@ done
 
 # The programs find their libraries and the plug-in beside themselves.
 run() { env -i HOME="$scratch/home" PATH=/usr/bin:/bin "$@"; }
-ldd "$usr/bin/hadrocli" | grep -q "libzorbel.so => $usr/lib/libzorbel.so" || fail "libzorbel not found beside hadrocli"
+libraries=$(ldd "$usr/bin/hadrocli")
+[[ $libraries == *"libzorbel.so => $usr/bin/../lib/libzorbel.so"* ]] || fail "libzorbel not found beside hadrocli"
 out=$(run "$usr/bin/hadrocli" --state="$scratch/host.json" network ip interface list 2>&1) ||
     fail "hadrocli network ip interface list: $out"
 grep -q "^Name: *tkn0\|tkn0" <<< "$out" || fail "no tkn0 in: $out"
-run "$usr/bin/hadrosim" --state="$scratch/host.json" export | grep -q '"version"' || fail "hadrosim export"
+exported=$(run "$usr/bin/hadrosim" --state="$scratch/host.json" export) || fail "hadrosim export"
+[[ $exported == *'"version"'* ]] || fail "hadrosim export printed no state"
 [ "$(stat -c %a "$scratch/host.json")" = 600 ] || fail "the state file is not private"
 
 # The installed completion completes from the installed tree and the host's names.

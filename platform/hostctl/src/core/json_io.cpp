@@ -1,7 +1,10 @@
 #include "core/json_io.h"
 
+#include <charconv>
 #include <cmath>
 #include <cstdio>
+#include <cstdlib>
+#include <cstring>
 
 #include "core/text.h"
 
@@ -40,26 +43,26 @@ void In::RangeFail(long double min, long double max) const {
 
 std::string In::Str() const {
     if (!value_->is_string()) Fail("expected a string");
-    return value_->get<std::string>();
+    return value_->String();
 }
 
 bool In::Bool() const {
     if (!value_->is_boolean()) Fail("expected true or false");
-    return value_->get<bool>();
+    return value_->Boolean();
 }
 
 const Value* In::Find(const char* key) const {
     if (!value_->is_object()) Fail("expected an object");
-    auto it = value_->find(key);
-    if (it == value_->end()) return nullptr;
+    const Value* member = value_->Find(key);
+    if (!member) return nullptr;
     if (hits_ < seen_.size()) seen_[hits_] = key;
     ++hits_;
-    return &*it;
+    return member;
 }
 
 bool In::Has(const char* key) const {
     if (!value_->is_object()) Fail("expected an object");
-    return value_->contains(key);
+    return value_->Find(key) != nullptr;
 }
 
 In In::Member(const char* key) const {
@@ -105,20 +108,348 @@ std::vector<std::string> In::Strings(const char* key) const {
 void In::Done() const {
     if (!value_->is_object() || hits_ >= value_->size()) return;
     // Slow path, only when a member was not read: name the first such member.
-    for (auto it = value_->begin(); it != value_->end(); ++it) {
+    const auto& keys = value_->Keys();
+    for (const auto& key : keys) {
         bool known = false;
         for (std::size_t i = 0; i < hits_ && i < seen_.size(); ++i) {
-            if (it.key() == seen_[i]) known = true;
+            if (key == seen_[i]) known = true;
         }
-        if (!known) Fail("unknown member " + Lib::Quote(it.key()));
+        if (!known) Fail("unknown member " + Lib::Quote(key));
+    }
+    for (std::size_t i = 0; i < keys.size(); ++i) {
+        for (std::size_t j = i + 1; j < keys.size(); ++j) {
+            if (keys[i] == keys[j]) Fail("member " + Lib::Quote(keys[i]) + " appears twice");
+        }
     }
     Fail("unknown member");
 }
 
+const Value* Value::Find(std::string_view key) const {
+    for (std::size_t i = keys_.size(); i-- > 0;) {
+        if (keys_[i] == key) return &items_[i];
+    }
+    return nullptr;
+}
+
+// A strict JSON parser (RFC 8259): UTF-8 text, no trailing commas, no comments, nothing
+// after the value. Integers that fit are kept exactly (unsigned when not negative); other
+// numbers become doubles. Nesting is limited so that no document can exhaust the stack.
+class Parser {
+public:
+    explicit Parser(std::string_view text)
+        : p_(text.data()), begin_(text.data()), end_(text.data() + text.size()) {}
+
+    Value Document() {
+        Value value;
+        Blanks();
+        ParseValue(value, 0);
+        Blanks();
+        if (p_ != end_) Fail("unexpected text after the value");
+        return value;
+    }
+
+private:
+    static constexpr int kMaxDepth = 512;
+
+    [[noreturn]] void Fail(const std::string& what) const {
+        throw Lib::SectionFault("syntax error at byte " + std::to_string(p_ - begin_) + ": " + what);
+    }
+    void Blanks() {
+        while (p_ != end_ && (*p_ == ' ' || *p_ == '\n' || *p_ == '\t' || *p_ == '\r'))
+            ++p_;
+    }
+    void Expect(char c, const char* what) {
+        if (p_ == end_ || *p_ != c) Fail(p_ == end_ ? std::string("unexpected end of text") : what);
+        ++p_;
+    }
+    void Literal(const char* word, std::size_t length) {
+        if (static_cast<std::size_t>(end_ - p_) < length || std::memcmp(p_, word, length) != 0)
+            Fail("unexpected character");
+        p_ += length;
+    }
+
+    void ParseValue(Value& value, int depth) {
+        if (p_ == end_) Fail("unexpected end of text");
+        switch (*p_) {
+            case '{':
+                ParseObject(value, depth + 1);
+                return;
+            case '[':
+                ParseArray(value, depth + 1);
+                return;
+            case '"':
+                value.kind_ = Value::Kind::kString;
+                ParseString(value.text_);
+                return;
+            case 't':
+                Literal("true", 4);
+                value.kind_ = Value::Kind::kBool;
+                value.boolean_ = true;
+                return;
+            case 'f':
+                Literal("false", 5);
+                value.kind_ = Value::Kind::kBool;
+                return;
+            case 'n':
+                Literal("null", 4);
+                return;
+            default:
+                ParseNumber(value);
+        }
+    }
+
+    void ParseObject(Value& value, int depth) {
+        if (depth > kMaxDepth) Fail("nested too deeply");
+        value.kind_ = Value::Kind::kObject;
+        ++p_;
+        Blanks();
+        if (p_ != end_ && *p_ == '}') {
+            ++p_;
+            return;
+        }
+        while (true) {
+            Blanks();
+            if (p_ == end_ || *p_ != '"')
+                Fail(p_ == end_ ? "unexpected end of text" : "expected a member name");
+            value.keys_.emplace_back();
+            ParseString(value.keys_.back());
+            Blanks();
+            Expect(':', "expected ':'");
+            Blanks();
+            value.items_.emplace_back();
+            ParseValue(value.items_.back(), depth);
+            Blanks();
+            if (p_ != end_ && *p_ == ',') {
+                ++p_;
+                continue;
+            }
+            Expect('}', "expected ',' or '}'");
+            return;
+        }
+    }
+
+    void ParseArray(Value& value, int depth) {
+        if (depth > kMaxDepth) Fail("nested too deeply");
+        value.kind_ = Value::Kind::kArray;
+        ++p_;
+        Blanks();
+        if (p_ != end_ && *p_ == ']') {
+            ++p_;
+            return;
+        }
+        while (true) {
+            Blanks();
+            value.items_.emplace_back();
+            ParseValue(value.items_.back(), depth);
+            Blanks();
+            if (p_ != end_ && *p_ == ',') {
+                ++p_;
+                continue;
+            }
+            Expect(']', "expected ',' or ']'");
+            return;
+        }
+    }
+
+    unsigned Hex4() {
+        if (end_ - p_ < 4) Fail("unexpected end of text");
+        unsigned code = 0;
+        for (int i = 0; i < 4; ++i) {
+            char c = *p_++;
+            code <<= 4;
+            if (c >= '0' && c <= '9') {
+                code |= static_cast<unsigned>(c - '0');
+            } else if (c >= 'a' && c <= 'f') {
+                code |= static_cast<unsigned>(c - 'a' + 10);
+            } else if (c >= 'A' && c <= 'F') {
+                code |= static_cast<unsigned>(c - 'A' + 10);
+            } else {
+                Fail("expected four hexadecimal digits after \\u");
+            }
+        }
+        return code;
+    }
+
+    static void AppendUtf8(std::string& out, unsigned code) {
+        if (code < 0x80) {
+            out += static_cast<char>(code);
+        } else if (code < 0x800) {
+            out += static_cast<char>(0xc0 | (code >> 6));
+            out += static_cast<char>(0x80 | (code & 0x3f));
+        } else if (code < 0x10000) {
+            out += static_cast<char>(0xe0 | (code >> 12));
+            out += static_cast<char>(0x80 | ((code >> 6) & 0x3f));
+            out += static_cast<char>(0x80 | (code & 0x3f));
+        } else {
+            out += static_cast<char>(0xf0 | (code >> 18));
+            out += static_cast<char>(0x80 | ((code >> 12) & 0x3f));
+            out += static_cast<char>(0x80 | ((code >> 6) & 0x3f));
+            out += static_cast<char>(0x80 | (code & 0x3f));
+        }
+    }
+
+    // The length of the well-formed UTF-8 sequence at p_ (its first byte is 0x80 or more),
+    // or 0.
+    std::size_t Utf8Length() const {
+        const auto* s = reinterpret_cast<const unsigned char*>(p_);
+        std::size_t left = static_cast<std::size_t>(end_ - p_);
+        auto tail = [&](std::size_t i) { return i < left && (s[i] & 0xc0) == 0x80; };
+        unsigned char c = s[0];
+        if (c >= 0xc2 && c <= 0xdf) return tail(1) ? 2 : 0;
+        if (c >= 0xe0 && c <= 0xef) {
+            if (!tail(1) || !tail(2)) return 0;
+            if (c == 0xe0 && s[1] < 0xa0) return 0;   // overlong
+            if (c == 0xed && s[1] >= 0xa0) return 0;  // a surrogate
+            return 3;
+        }
+        if (c >= 0xf0 && c <= 0xf4) {
+            if (!tail(1) || !tail(2) || !tail(3)) return 0;
+            if (c == 0xf0 && s[1] < 0x90) return 0;   // overlong
+            if (c == 0xf4 && s[1] >= 0x90) return 0;  // beyond U+10FFFF
+            return 4;
+        }
+        return 0;
+    }
+
+    void ParseString(std::string& out) {
+        ++p_;  // the opening quote
+        while (true) {
+            // Plain bytes in one go.
+            const char* start = p_;
+            while (p_ != end_ && *p_ != '"' && *p_ != '\\' && static_cast<unsigned char>(*p_) >= 0x20 &&
+                   static_cast<unsigned char>(*p_) < 0x80)
+                ++p_;
+            out.append(start, static_cast<std::size_t>(p_ - start));
+            if (p_ == end_) Fail("a string is not closed");
+            unsigned char c = static_cast<unsigned char>(*p_);
+            if (c == '"') {
+                ++p_;
+                return;
+            }
+            if (c < 0x20) Fail("control character in a string");
+            if (c >= 0x80) {
+                std::size_t length = Utf8Length();
+                if (!length) Fail("a string is not valid UTF-8");
+                out.append(p_, length);
+                p_ += length;
+                continue;
+            }
+            // A backslash.
+            ++p_;
+            if (p_ == end_) Fail("a string is not closed");
+            char e = *p_++;
+            switch (e) {
+                case '"':
+                    out += '"';
+                    break;
+                case '\\':
+                    out += '\\';
+                    break;
+                case '/':
+                    out += '/';
+                    break;
+                case 'b':
+                    out += '\b';
+                    break;
+                case 'f':
+                    out += '\f';
+                    break;
+                case 'n':
+                    out += '\n';
+                    break;
+                case 'r':
+                    out += '\r';
+                    break;
+                case 't':
+                    out += '\t';
+                    break;
+                case 'u': {
+                    unsigned code = Hex4();
+                    if (code >= 0xdc00 && code <= 0xdfff) Fail("a lone low surrogate in \\u escapes");
+                    if (code >= 0xd800 && code <= 0xdbff) {
+                        if (end_ - p_ < 2 || p_[0] != '\\' || p_[1] != 'u')
+                            Fail("a lone high surrogate in \\u escapes");
+                        p_ += 2;
+                        unsigned low = Hex4();
+                        if (low < 0xdc00 || low > 0xdfff) Fail("a lone high surrogate in \\u escapes");
+                        code = 0x10000 + ((code - 0xd800) << 10) + (low - 0xdc00);
+                    }
+                    AppendUtf8(out, code);
+                    break;
+                }
+                default:
+                    --p_;
+                    Fail("unknown escape in a string");
+            }
+        }
+    }
+
+    void ParseNumber(Value& value) {
+        const char* start = p_;
+        bool negative = false;
+        if (*p_ == '-') {
+            negative = true;
+            ++p_;
+        }
+        auto digits = [&] {
+            const char* from = p_;
+            while (p_ != end_ && *p_ >= '0' && *p_ <= '9')
+                ++p_;
+            return p_ - from;
+        };
+        if (p_ == end_ || *p_ < '0' || *p_ > '9')
+            Fail(p_ == start ? "unexpected character" : "expected digits");
+        if (*p_ == '0') {
+            ++p_;
+        } else {
+            digits();
+        }
+        bool integral = true;
+        if (p_ != end_ && *p_ == '.') {
+            ++p_;
+            integral = false;
+            if (digits() == 0) Fail("expected digits after '.'");
+        }
+        if (p_ != end_ && (*p_ == 'e' || *p_ == 'E')) {
+            ++p_;
+            integral = false;
+            if (p_ != end_ && (*p_ == '+' || *p_ == '-')) ++p_;
+            if (digits() == 0) Fail("expected digits in the exponent");
+        }
+        if (p_ != end_ && *p_ >= '0' && *p_ <= '9') Fail("a number has a leading zero");
+        if (integral) {
+            if (negative) {
+                std::int64_t v = 0;
+                auto [at, error] = std::from_chars(start, p_, v);
+                if (error == std::errc() && at == p_) {
+                    value.kind_ = Value::Kind::kInt;
+                    value.integer_ = v;
+                    return;
+                }
+            } else {
+                std::uint64_t v = 0;
+                auto [at, error] = std::from_chars(start, p_, v);
+                if (error == std::errc() && at == p_) {
+                    value.kind_ = Value::Kind::kUnsigned;
+                    value.unsigned_ = v;
+                    value.integer_ = static_cast<std::int64_t>(v);
+                    return;
+                }
+            }
+        }
+        value.kind_ = Value::Kind::kDouble;
+        value.double_ = std::strtod(std::string(start, p_).c_str(), nullptr);
+    }
+
+    const char* p_;
+    const char* begin_;
+    const char* end_;
+};
+
 Value Parse(std::string_view text, const char* sectionName) {
     try {
-        return Value::parse(text.begin(), text.end());
-    } catch (const nlohmann::json::exception& e) {
+        return Parser(text).Document();
+    } catch (const Lib::SectionFault& e) {
         throw Lib::SectionFault(std::string(sectionName) + ": not valid JSON: " + Lib::Printable(e.what()));
     }
 }

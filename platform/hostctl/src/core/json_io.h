@@ -21,8 +21,47 @@
 
 namespace TknCtl::Json {
 
-using Value = nlohmann::json;         // parsed input
 using Node = nlohmann::ordered_json;  // output, members in insertion order
+
+// A parsed JSON value. Reading the state is what every command pays for, in proportion to
+// the size of the sections it touches: this representation and its parser (Parse) are made
+// for that, with objects as flat lists of members (a section's objects are small).
+class Value {
+public:
+    enum class Kind : std::uint8_t { kNull, kBool, kInt, kUnsigned, kDouble, kString, kArray, kObject };
+
+    Kind kind() const { return kind_; }
+    bool is_object() const { return kind_ == Kind::kObject; }
+    bool is_array() const { return kind_ == Kind::kArray; }
+    bool is_string() const { return kind_ == Kind::kString; }
+    bool is_boolean() const { return kind_ == Kind::kBool; }
+    // Any integer; an unsigned one is a non-negative integer.
+    bool is_number_integer() const { return kind_ == Kind::kInt || kind_ == Kind::kUnsigned; }
+    bool is_number_unsigned() const { return kind_ == Kind::kUnsigned; }
+    bool Boolean() const { return boolean_; }
+    std::int64_t Integer() const { return integer_; }
+    std::uint64_t Unsigned() const { return unsigned_; }
+    double Double() const { return double_; }
+    const std::string& String() const { return text_; }
+    // Elements of an array, values of an object's members.
+    const std::vector<Value>& Items() const { return items_; }
+    // Names of an object's members, in document order (Items() holds their values).
+    const std::vector<std::string>& Keys() const { return keys_; }
+    std::size_t size() const { return items_.size(); }
+    // The value of a member (the last one, were the name given twice), or nullptr.
+    const Value* Find(std::string_view key) const;
+
+private:
+    friend class Parser;
+    Kind kind_ = Kind::kNull;
+    bool boolean_ = false;
+    std::int64_t integer_ = 0;
+    std::uint64_t unsigned_ = 0;
+    double double_ = 0;
+    std::string text_;
+    std::vector<Value> items_;
+    std::vector<std::string> keys_;
+};
 
 class In {
 public:
@@ -42,10 +81,10 @@ public:
     I Int() const {
         static_assert(std::is_integral_v<I> && !std::is_same_v<I, bool>);
         if (value_->is_number_unsigned()) {
-            auto v = value_->get<std::uint64_t>();
+            auto v = value_->Unsigned();
             if (v <= static_cast<std::uint64_t>(std::numeric_limits<I>::max())) return static_cast<I>(v);
         } else if (value_->is_number_integer()) {
-            auto v = value_->get<std::int64_t>();
+            auto v = value_->Integer();
             if constexpr (std::is_signed_v<I>) {
                 if (v >= std::numeric_limits<I>::min() && v <= std::numeric_limits<I>::max())
                     return static_cast<I>(v);
@@ -61,7 +100,7 @@ public:
     void Elements(F&& each) const {
         if (!value_->is_array()) Fail("expected an array");
         std::size_t index = 0;
-        for (const auto& element : *value_) {
+        for (const auto& element : value_->Items()) {
             In child(element, this, nullptr, index++);
             each(child);
         }

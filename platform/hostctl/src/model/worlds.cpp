@@ -5,10 +5,20 @@
 namespace TknCtl::Model {
 
 const World* WorldsSection::Find(std::uint32_t id) const {
-    for (const auto& world : worlds) {
-        if (world.id == id) return &world;
-    }
-    return nullptr;
+    // Sockets, ports and functions name their worlds by ID: a host with thousands of each
+    // looks worlds up thousands of times.
+    auto lookup = [&]() -> const World* {
+        auto hit = index.find(id);
+        if (hit == index.end() || hit->second >= worlds.size() || worlds[hit->second].id != id)
+            return nullptr;
+        return &worlds[hit->second];
+    };
+    if (const World* world = lookup()) return world;
+    // An unknown ID, or worlds changed since the index was made: index them again.
+    index.clear();
+    for (std::size_t i = 0; i < worlds.size(); ++i)
+        index.emplace(worlds[i].id, i);
+    return lookup();
 }
 
 namespace {

@@ -1,0 +1,119 @@
+// The parser of state sections: what it accepts, what it refuses, and that nothing it is
+// given can crash it.
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "core/json_io.h"
+
+namespace {
+
+using TknCtl::Json::In;
+using TknCtl::Json::Parse;
+using TknCtl::Json::Value;
+
+std::string Refusal(const std::string& text) {
+    try {
+        Parse(text, "s");
+    } catch (const TknCtl::Lib::SectionFault& e) {
+        return e.what();
+    }
+    return "accepted";
+}
+
+TEST(StateParse, StringsDecodeEscapesAndKeepUtf8) {
+    Value v = Parse(R"(["a\"\\\/\b\f\n\r\t", "\u00e9\u20ac\ud83d\ude00", "é€😀", ""])", "s");
+    ASSERT_TRUE(v.is_array());
+    ASSERT_EQ(v.size(), 4u);
+    EXPECT_EQ(v.Items()[0].String(), "a\"\\/\b\f\n\r\t");
+    EXPECT_EQ(v.Items()[1].String(), "\xc3\xa9\xe2\x82\xac\xf0\x9f\x98\x80");
+    EXPECT_EQ(v.Items()[2].String(), v.Items()[1].String());
+    EXPECT_EQ(v.Items()[3].String(), "");
+}
+
+TEST(StateParse, RefusesWhatIsNotStrictJson) {
+    for (const char* bad : {"",
+                            "[1,]",
+                            "{\"a\":1,}",
+                            "[1] x",
+                            "[01]",
+                            "[1.]",
+                            "[1e]",
+                            "[-]",
+                            "[+1]",
+                            "[tru]",
+                            "[\"open]",
+                            "[\"\\x\"]",
+                            "[\"\\ud800\"]",
+                            "[\"\\udc00\"]",
+                            "[\"\\ud800\\u0041\"]",
+                            "[\"\\u12g4\"]",
+                            "{1:2}",
+                            "{\"a\" 1}",
+                            "[1 2]",
+                            "[nul]",
+                            "'a'"}) {
+        EXPECT_NE(Refusal(bad).find("s: not valid JSON: syntax error at byte "), std::string::npos) << bad;
+    }
+    // Raw control characters and bytes that are not UTF-8 (stray, overlong, surrogates,
+    // beyond U+10FFFF, cut short).
+    for (std::string bad :
+         {std::string("[\"a\tb\"]"), std::string("[\"\x80\"]"), std::string("[\"\xc0\x80\"]"),
+          std::string("[\"\xe0\x80\x80\"]"), std::string("[\"\xed\xa0\x80\"]"),
+          std::string("[\"\xf4\x90\x80\x80\"]"), std::string("[\"\xe2\x82\"]")}) {
+        EXPECT_NE(Refusal(bad).find("not valid JSON"), std::string::npos) << bad;
+    }
+    // Deep nesting is refused, not followed down the stack.
+    EXPECT_EQ(Refusal(std::string(400, '[') + std::string(400, ']')), "accepted");
+    EXPECT_NE(Refusal(std::string(100000, '[')).find("nested too deeply"), std::string::npos);
+}
+
+TEST(StateParse, NumbersKeepTheirKind) {
+    Value v = Parse("[18446744073709551615, -9223372036854775808, -0, 18446744073709551616, 1.5, 2e3]", "s");
+    const auto& n = v.Items();
+    EXPECT_TRUE(n[0].is_number_unsigned());
+    EXPECT_EQ(n[0].Unsigned(), 18446744073709551615ull);
+    EXPECT_TRUE(n[1].is_number_integer());
+    EXPECT_FALSE(n[1].is_number_unsigned());
+    EXPECT_EQ(n[1].Integer(), INT64_MIN);
+    EXPECT_TRUE(n[2].is_number_integer());
+    EXPECT_EQ(n[2].Integer(), 0);
+    for (int i : {3, 4, 5})
+        EXPECT_FALSE(n[static_cast<std::size_t>(i)].is_number_integer()) << i;
+    EXPECT_DOUBLE_EQ(n[5].Double(), 2000);
+    // Read as integers of a given width.
+    Value doc = Parse(R"({"small": 7, "negative": -1, "float": 2e3, "huge": 18446744073709551616})", "s");
+    In in(doc, "s");
+    EXPECT_EQ(in.Int<std::uint8_t>("small"), 7);
+    EXPECT_EQ(in.Int<std::int32_t>("negative"), -1);
+    auto refused = [&](auto read) {
+        try {
+            read();
+        } catch (const TknCtl::Lib::SectionFault& e) {
+            return std::string(e.what());
+        }
+        return std::string("read");
+    };
+    EXPECT_EQ(refused([&] { in.Int<std::uint32_t>("negative"); }),
+              "s.negative: expected an integer from 0 to 4294967295");
+    EXPECT_EQ(refused([&] { in.Int<std::uint32_t>("float"); }), "s.float: expected an integer");
+    EXPECT_EQ(refused([&] { in.Int<std::uint64_t>("huge"); }), "s.huge: expected an integer");
+}
+
+TEST(StateParse, MembersAreReadOnceAndNeverTwice) {
+    Value doc = Parse(R"({"name": "a", "extra": 1})", "s");
+    In in(doc, "s");
+    EXPECT_EQ(in.Str("name"), "a");
+    EXPECT_THROW(in.Done(), TknCtl::Lib::SectionFault);
+    Value twice = Parse(R"({"name": "a", "name": "b"})", "s");
+    In second(twice, "s");
+    EXPECT_EQ(second.Str("name"), "b");
+    try {
+        second.Done();
+        FAIL() << "a member given twice was accepted";
+    } catch (const TknCtl::Lib::SectionFault& e) {
+        EXPECT_STREQ(e.what(), "s: member 'name' appears twice");
+    }
+}
+
+}  // namespace

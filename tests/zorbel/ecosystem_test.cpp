@@ -111,6 +111,33 @@ TEST(Completion, BashCompletesTheTreeOptionsValuesAndHostNames) {
     EXPECT_EQ(Complete("network nosuch ''"), "");
 }
 
+// The zsh script's walk over the words, run by zsh with the completion builtins standing in:
+// compadd prints what it is given.
+std::string CompleteZsh(const std::string& words) {
+    std::string script =
+        "compadd() { while [[ $1 == -* && $1 != -- ]]; do [[ $1 == -S ]] && shift; shift; done; "
+        "[[ $1 == -- ]] && shift; for w in \"$@\"; do printf '%s|' \"$w\"; done; }; compset() { :; }; "
+        "compdef() { :; }; source <(\"$0\" --completion zsh) || exit 9; words=(\"$0\" --state=\"$1\" " +
+        words + "); CURRENT=${#words}; _hadrocli";
+    std::string command = "zsh -f -c '";
+    for (char c : script)
+        command += c == '\'' ? std::string("'\\''") : std::string(1, c);
+    command += "' " + std::string(HADROCLI) + " " + State() + " 2>&1";
+    return Shell(command).out;
+}
+
+TEST(Completion, ZshCompletesTheSameWay) {
+    if (Shell("command -v zsh >/dev/null").status != 0) GTEST_SKIP() << "no zsh";
+    EXPECT_EQ(CompleteZsh("''"), "network|");
+    EXPECT_EQ(CompleteZsh("--formatter ''"), "simple|table|json|xml|csv|keyvalue|");
+    EXPECT_EQ(CompleteZsh("network ip interface set --interface-name tkn0 --"), "--enabled|--mtu|");
+    EXPECT_EQ(CompleteZsh("network ip interface set --enabled ''"), "true|false|");
+    EXPECT_EQ(CompleteZsh("network ip interface set -i ''").substr(0, 10), "tkn0|tkn1|");
+    EXPECT_NE(CompleteZsh("network vswitch standard portgroup remove --portgroup-name=M")
+                  .find("Management Network|"),
+              std::string::npos);
+}
+
 TEST(Manual, ManPageAndReferenceCoverEveryCommand) {
     auto list = Shell(std::string(HADROCLI) + " --list-commands | cut -f1");
     auto man = Shell(std::string(HADROCLI) + " --manual");

@@ -136,6 +136,14 @@ TEST(Xml, TypedWellFormedAndEscaped) {
               "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<output>\n  <list/>\n</output>\n");
 }
 
+TEST(Csv, CommandListing) {
+    auto r = Cli({"--formatter=csv", "--list-commands"});
+    EXPECT_EQ(r.out.substr(0, r.out.find("test types set")),
+              "path,description\r\ntest types show,Show the parsed value of every parameter.\r\n");
+    r = Cli({"--formatter=keyvalue", "--format-param=fields=path", "--list-commands"});
+    EXPECT_EQ(r.out.substr(0, 58), "Command.path=test types show\n\nCommand.path=test types set\n");
+}
+
 TEST(FormatParameters, ChooseFieldsHideHeadersAndRefuseMistakes) {
     // fields over the command's own choice, for every formatter, json included.
     EXPECT_EQ(Cli({"--format-param=fields=Timeout,Name", "test", "record", "get"}).out,

@@ -222,6 +222,16 @@ void Dispatcher::WriteCommandList(const GlobalOptions& options, std::ostream& ou
             text += '}';
         }
         text += "]\n";
+    } else if (options.formatter == "xml" || options.formatter == "csv" || options.formatter == "keyvalue") {
+        // The machine formats: one record per command, fields "path" and "description".
+        auto list = MetaObj::MetaList::New(MetaObj::META_STRUCT);
+        for (const auto& [path, command] : commands) {
+            auto record = MetaObj::MetaStruct::New("Command");
+            record->SetField("path", path);
+            record->SetField("description", command->GetDescription());
+            list->Add(record);
+        }
+        Format::Render(options.formatter, *list, Format::OutputParameters(options.formatParameters), text);
     } else {
         for (const auto& [path, command] : commands) {
             text += path;

@@ -107,6 +107,9 @@ TEST(Completion, BashCompletesTheTreeOptionsValuesAndHostNames) {
               "Management\\ Network|");
     EXPECT_EQ(Complete("network vswitch standard portgroup remove --portgroup-name '\"Man'"),
               "Management Network|");
+    EXPECT_EQ(Hadrocli("network vswitch standard portgroup add -p 'it'\\''s \"x\"' -v vSwitch1").status, 0);
+    EXPECT_EQ(Complete("network vswitch standard portgroup remove --portgroup-name it"),
+              "it\\\'s\\ \\\"x\\\"|");
     // Unknown words complete to nothing.
     EXPECT_EQ(Complete("network nosuch ''"), "");
 }

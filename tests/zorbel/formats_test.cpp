@@ -187,6 +187,12 @@ TEST(FormatParameters, ChooseFieldsHideHeadersAndRefuseMistakes) {
          EXIT_REFUSED,
          "Error: --format-param fields: this command's result has no fields\n"
          "Usage: hadrocli test types set [options]; see 'hadrocli test types set --help'.\n"},
+        {{"--completion=fish"},
+         EXIT_REFUSED,
+         "unknown shell 'fish' for --completion (choose from bash, zsh)"},
+        {{"--manual=html"},
+         EXIT_REFUSED,
+         "unknown manual format 'html' for --manual (choose from man, markdown)"},
         {{"--formatter=yaml", "test", "record", "get"},
          EXIT_REFUSED,
          "unknown formatter 'yaml' for --formatter (choose from simple, table, json, xml, csv, keyvalue)"},

@@ -144,6 +144,64 @@ TEST(Csv, CommandListing) {
     EXPECT_EQ(r.out.substr(0, 58), "Command.path=test types show\n\nCommand.path=test types set\n");
 }
 
+// Every byte value, alone and in the sequences a careless escaper gets wrong.
+std::string AllBytes() {
+    std::string text;
+    for (int c = 1; c < 256; ++c)
+        text += static_cast<char>(c);
+    return text +
+           "\xC2\x9B\xC2\xA0\xE2\x82\xAC\xEF\xBF\xBF\xF0\x9F\x98\x80\xED\xA0\x80\xC0\xAF\xF4\x90\x80\x80";
+}
+
+bool WellFormedUtf8WithoutControls(const std::string& text, const std::string& allowed) {
+    for (std::size_t i = 0; i < text.size();) {
+        auto c = static_cast<unsigned char>(text[i]);
+        if (c < 0x80) {
+            if ((c < 0x20 || c == 0x7f) && allowed.find(static_cast<char>(c)) == std::string::npos)
+                return false;
+            ++i;
+            continue;
+        }
+        std::size_t length = c >= 0xF0 ? 4 : c >= 0xE0 ? 3 : c >= 0xC2 ? 2 : 0;
+        if (length == 0 || i + length > text.size()) return false;
+        for (std::size_t k = 1; k < length; ++k)
+            if ((static_cast<unsigned char>(text[i + k]) & 0xC0) != 0x80) return false;
+        if (length == 2 && c == 0xC2 && static_cast<unsigned char>(text[i + 1]) < 0xA0) return false;  // C1
+        i += length;
+    }
+    return true;
+}
+
+TEST(Escaping, AnyBytesStaySafeAndKeyValueGivesThemBack) {
+    const std::string name = AllBytes();
+    auto r =
+        Cli({"--formatter=keyvalue", "--format-param=fields=name", "test", "types", "show", "--name", name});
+    ASSERT_EQ(r.out.rfind("Parsed.name=", 0), 0u);
+    std::string line = r.out.substr(12, r.out.size() - 13);
+    EXPECT_EQ(line.find('\n'), std::string::npos);
+    EXPECT_TRUE(WellFormedUtf8WithoutControls(line, ""));
+    std::string decoded;  // what printf '%b' does with the escapes
+    for (std::size_t i = 0; i < line.size(); ++i) {
+        if (line[i] != '\\') {
+            decoded += line[i];
+            continue;
+        }
+        char e = line[++i];
+        if (e == 'x') {
+            decoded += static_cast<char>(std::stoi(line.substr(i + 1, 2), nullptr, 16));
+            i += 2;
+        } else {
+            decoded += e == 'n' ? '\n' : e == 'r' ? '\r' : e == 't' ? '\t' : e;
+        }
+    }
+    EXPECT_EQ(decoded, name);
+
+    for (const char* formatter : {"xml", "csv", "simple", "table", "json"}) {
+        r = Cli({std::string("--formatter=") + formatter, "test", "types", "show", "--name", name});
+        EXPECT_TRUE(WellFormedUtf8WithoutControls(r.out, "\n\r\t")) << formatter;
+    }
+}
+
 TEST(FormatParameters, ChooseFieldsHideHeadersAndRefuseMistakes) {
     // fields over the command's own choice, for every formatter, json included.
     EXPECT_EQ(Cli({"--format-param=fields=Timeout,Name", "test", "record", "get"}).out,

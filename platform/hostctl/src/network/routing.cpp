@@ -258,8 +258,20 @@ std::string NeighborType(const std::string& netstack, const Neighbor& neighbor) 
     RequireNetstack(netstack);
     const decltype(Neighbor::address)* tag = nullptr;
     if (const auto* stack = Lib::Read<Model::NeighborsSection>().Find(netstack)) {
-        for (const auto& e : Table(*stack, tag)) {
-            if (e.address == neighbor.address && e.interface == neighbor.interfaceName) return e.type;
+        const auto& table = Table(*stack, tag);
+        auto matches = [&](const auto& e) {
+            return e.address == neighbor.address && e.interface == neighbor.interfaceName;
+        };
+        // A listing asks for the type of every neighbour in table order: the entry after the
+        // last one found comes first, so that a table of thousands is not searched once per
+        // entry. The search from the start still answers any other order.
+        static std::size_t next = 0;
+        if (next < table.size() && matches(table[next])) return table[next++].type;
+        for (std::size_t i = 0; i < table.size(); ++i) {
+            if (matches(table[i])) {
+                next = i + 1;
+                return table[i].type;
+            }
         }
     }
     throw HostCtlException("Netstack " + Lib::Quote(netstack) + " has no neighbour " +

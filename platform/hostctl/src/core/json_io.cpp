@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <deque>
 
 #include "core/text.h"
 
@@ -198,6 +199,22 @@ private:
         }
     }
 
+    // The members or elements of a value at one depth are gathered in a scratch list that
+    // is kept from one value to the next, then moved into a vector of the exact size: one
+    // allocation per value instead of one per doubling.
+    std::vector<Value>& ScratchItems(int depth) {
+        auto at = static_cast<std::size_t>(depth);
+        if (scratchItems_.size() <= at) scratchItems_.resize(at + 1);
+        scratchItems_[at].clear();
+        return scratchItems_[at];
+    }
+    static void MoveInto(std::vector<Value>& from, std::vector<Value>& to) {
+        to.reserve(from.size());
+        for (auto& item : from)
+            to.push_back(std::move(item));
+        from.clear();
+    }
+
     void ParseObject(Value& value, int depth) {
         if (depth > kMaxDepth) Fail("nested too deeply");
         value.kind_ = Value::Kind::kObject;
@@ -207,23 +224,33 @@ private:
             ++p_;
             return;
         }
+        auto at = static_cast<std::size_t>(depth);
+        if (scratchKeys_.size() <= at) scratchKeys_.resize(at + 1);
+        auto& keys = scratchKeys_[at];
+        keys.clear();
+        auto& items = ScratchItems(depth);
         while (true) {
             Blanks();
             if (p_ == end_ || *p_ != '"')
                 Fail(p_ == end_ ? "unexpected end of text" : "expected a member name");
-            value.keys_.emplace_back();
-            ParseString(value.keys_.back());
+            keys.emplace_back();
+            ParseString(keys.back());
             Blanks();
             Expect(':', "expected ':'");
             Blanks();
-            value.items_.emplace_back();
-            ParseValue(value.items_.back(), depth);
+            items.emplace_back();
+            ParseValue(items.back(), depth);
             Blanks();
             if (p_ != end_ && *p_ == ',') {
                 ++p_;
                 continue;
             }
             Expect('}', "expected ',' or '}'");
+            value.keys_.reserve(keys.size());
+            for (auto& key : keys)
+                value.keys_.push_back(std::move(key));
+            keys.clear();
+            MoveInto(items, value.items_);
             return;
         }
     }
@@ -237,16 +264,18 @@ private:
             ++p_;
             return;
         }
+        auto& items = ScratchItems(depth);
         while (true) {
             Blanks();
-            value.items_.emplace_back();
-            ParseValue(value.items_.back(), depth);
+            items.emplace_back();
+            ParseValue(items.back(), depth);
             Blanks();
             if (p_ != end_ && *p_ == ',') {
                 ++p_;
                 continue;
             }
             Expect(']', "expected ',' or ']'");
+            MoveInto(items, value.items_);
             return;
         }
     }
@@ -444,6 +473,9 @@ private:
     const char* p_;
     const char* begin_;
     const char* end_;
+    // By depth; a deque, so that the lists of outer values stay where they are.
+    std::deque<std::vector<Value>> scratchItems_;
+    std::deque<std::vector<std::string>> scratchKeys_;
 };
 
 Value Parse(std::string_view text, const char* sectionName) {

@@ -39,8 +39,19 @@ if(NOT HADRO_FUZZ)
         DEPENDS hadrocli network ${CMAKE_CURRENT_LIST_DIR}/hadro-generate.cmake
         COMMENT "Writing the man page and the shell completions"
         VERBATIM)
-    add_custom_target(hadro_generated ALL DEPENDS ${HADRO_GENERATED})
-    install(FILES ${HADRO_SHARE_DIR}/man/man1/hadrocli.1 DESTINATION share/man/man1)
+    # Man pages are installed compressed, as Debian wants them (gzip -9n: reproducible).
+    find_program(HADRO_GZIP gzip)
+    set(HADRO_MAN_PAGE ${HADRO_SHARE_DIR}/man/man1/hadrocli.1)
+    if(HADRO_GZIP)
+        add_custom_command(
+            OUTPUT ${HADRO_MAN_PAGE}.gz
+            COMMAND ${HADRO_GZIP} -9nkf ${HADRO_MAN_PAGE}
+            DEPENDS ${HADRO_MAN_PAGE}
+            VERBATIM)
+        set(HADRO_MAN_PAGE ${HADRO_MAN_PAGE}.gz)
+    endif()
+    add_custom_target(hadro_generated ALL DEPENDS ${HADRO_GENERATED} ${HADRO_MAN_PAGE})
+    install(FILES ${HADRO_MAN_PAGE} DESTINATION share/man/man1)
     install(FILES ${HADRO_SHARE_DIR}/bash-completion/completions/hadrocli
             DESTINATION share/bash-completion/completions)
     install(FILES ${HADRO_SHARE_DIR}/zsh/vendor-completions/_hadrocli DESTINATION share/zsh/vendor-completions)

@@ -14,9 +14,15 @@ dpkg-deb -f "$deb" Package Version Depends
 dpkg -x "$deb" "$scratch/root"
 usr="$scratch/root/usr"
 for file in bin/hadrocli bin/hadrosim lib/libzorbel.so lib/libhostctl.so lib/hadro/plugins/libnetwork.so \
-    share/man/man1/hadrocli.1 share/bash-completion/completions/hadrocli share/zsh/vendor-completions/_hadrocli; do
+    share/man/man1/hadrocli.1.gz share/bash-completion/completions/hadrocli share/zsh/vendor-completions/_hadrocli; do
     [ -f "$usr/$file" ] || fail "the package lacks $file"
 done
+
+# The man page reads without a warning.
+if command -v groff >/dev/null; then
+    warnings=$(gzip -dc "$usr/share/man/man1/hadrocli.1.gz" | groff -man -Tutf8 -ww -z 2>&1)
+    [ -z "$warnings" ] || fail "man page: $warnings"
+fi
 
 # The programs find their libraries and the plug-in beside themselves.
 run() { env -i HOME="$scratch/home" PATH=/usr/bin:/bin "$@"; }

@@ -243,7 +243,9 @@ std::vector<std::pair<std::string, std::string>> GlobalOptionRows() {
         {"--batch=FILE",
          "Run the command lines of FILE (- for standard input), one per line, in one session."},
         {"--atomic", "With --batch: every line must succeed, else nothing is changed."},
-        {"--manual", "Write the manual page (troff) of every command."},
+        {"--manual[=markdown]",
+         "Write the manual page (troff) of every command; with =markdown, the command reference in "
+         "Markdown."},
         {"--completion=SHELL", "Write the completion script for bash or zsh."},
         {"--help, -h", "Show this help; after a namespace or command, its help."},
         {"--version", "Show the version."},

@@ -118,7 +118,7 @@ TEST(Completion, BashCompletesTheTreeOptionsValuesAndHostNames) {
 // compadd prints what it is given.
 std::string CompleteZsh(const std::string& words) {
     std::string script =
-        "compadd() { while [[ $1 == -* && $1 != -- ]]; do [[ $1 == -S ]] && shift; shift; done; "
+        "compadd() { while [[ $1 == -* && $1 != -- ]]; do [[ $1 == -[Sd] ]] && shift; shift; done; "
         "[[ $1 == -- ]] && shift; for w in \"$@\"; do printf '%s|' \"$w\"; done; }; compset() { :; }; "
         "compdef() { :; }; source <(\"$0\" --completion zsh) || exit 9; words=(\"$0\" --state=\"$1\" " +
         words + "); CURRENT=${#words}; _hadrocli";

@@ -70,7 +70,20 @@ struct Tables {
     std::map<std::string, std::string> values;    // "path --long" -> values, "@kind", or "" (free)
     std::map<std::string, std::string> lists;     // "path --long" of options that may be repeated
     std::map<std::string, std::string> sources;   // kind -> "FIELD\nlist command path"
+    // zsh shows these beside the candidates: "path" of a namespace or command, "path --long".
+    std::map<std::string, std::string> descriptions;
 };
+
+// The first line of a description, without edge blanks: what fits beside a candidate.
+std::string Summary(const std::string& text) {
+    std::size_t start = text.find_first_not_of(" \n");
+    if (start == std::string::npos) return {};
+    std::size_t end = text.find('\n', start);
+    std::string line = text.substr(start, end == std::string::npos ? std::string::npos : end - start);
+    while (!line.empty() && line.back() == ' ')
+        line.pop_back();
+    return Format::TerminalSafe(line);
+}
 
 std::shared_ptr<NamespaceNode> Find(NamespaceNode& root, const std::string& path) {
     std::shared_ptr<NamespaceNode> node = root.GetThis();
@@ -92,6 +105,7 @@ void Walk(const std::shared_ptr<NamespaceNode>& node, const std::string& path, T
         if (!child) continue;
         names.push_back(name);
         std::string childPath = path.empty() ? name : path + " " + name;
+        tables.descriptions[childPath] = Summary(child->GetDescription());
         if (child->GetType() != AutoCli::NODE_COMMAND) {
             Walk(child, childPath, tables, kinds);
             continue;
@@ -104,6 +118,7 @@ void Walk(const std::shared_ptr<NamespaceNode>& node, const std::string& path, T
                 std::string longName = "--" + parameter->GetName();
                 options.push_back(longName);
                 std::string key = childPath + " " + longName;
+                tables.descriptions[key] = Summary(parameter->GetDescription());
                 if (!parameter->GetShortName().empty())
                     tables.shorts[childPath + " -" + parameter->GetShortName()] = longName;
                 if (parameter->GetType() == CallSpec::PARAM_STRING_LIST) tables.lists[key] = "1";
@@ -181,6 +196,7 @@ std::string Data(const Tables& tables, const std::string& declare, const std::st
     out += Array(declare, "_" + id + "_values", tables.values);
     out += Array(declare, "_" + id + "_lists", tables.lists);
     out += Array(declare, "_" + id + "_sources", tables.sources);
+    if (declare == "typeset -gA") out += Array(declare, "_" + id + "_descriptions", tables.descriptions);
     std::string formatters;
     for (const auto& name : Format::FormatterNames())
         formatters += (formatters.empty() ? "" : "\n") + name;
@@ -411,6 +427,18 @@ _@ID@_names() {
     done
 }
 
+# Adds candidates with their descriptions beside them: $1 is the path they hang under.
+_@ID@_described() {
+    local node=$1 candidate description
+    shift
+    local -a shown
+    for candidate in "$@"; do
+        description=${_@ID@_descriptions[${node:+$node }$candidate]}
+        shown+=("$candidate${description:+  -- $description}")
+    done
+    compadd -l -d shown -- "$@"
+}
+
 _@ID@_global_value() {
     case $1 in
         --formatter) compadd -- "${(@f)_@ID@_formatters}" ;;
@@ -463,7 +491,7 @@ _@ID@() {
         elif [[ $cur == -* ]]; then
             compadd -- "${(@f)_@ID@_global_options}"
         else
-            compadd -- "${(@f)_@ID@_children[.]}"
+            _@ID@_described "" "${(@f)_@ID@_children[.]}"
         fi
         return 0
     fi
@@ -489,7 +517,7 @@ _@ID@() {
             if [[ $cur == -* ]]; then
                 compadd -- --help
             else
-                compadd -- "${(@f)_@ID@_children[${node:-.}]}"
+                _@ID@_described "$node" "${(@f)_@ID@_children[${node:-.}]}"
             fi
         fi
         return 0
@@ -528,7 +556,7 @@ _@ID@() {
         fi
         candidates+=("$option")
     done
-    compadd -- "${candidates[@]}"
+    _@ID@_described "$node" "${candidates[@]}"
 }
 
 if [[ ${zsh_eval_context[-1]} == loadautofunc ]]; then

@@ -32,12 +32,14 @@ results=$work/results.tsv
 : >"$results"
 runs() { if [ $quick = 1 ]; then echo $(( ($1 + 4) / 5 )); else echo "$1"; fi; }
 
-# measure NAME RUNS PREPARE COMMAND...: the median wall time of COMMAND in ms, appended to
-# results.tsv. PREPARE (a shell command, may be empty) runs before each run, untimed.
+# measure NAME RUNS PREPARE COMMAND...: the median wall time of COMMAND in ms, and with
+# hyperfine its mean CPU time (user and system; steadier than wall time on a busy machine),
+# appended to results.tsv. PREPARE (a shell command, may be empty) runs before each run,
+# untimed.
 measure() {
     local name=$1 n=$2 prepare=$3
     shift 3
-    local median
+    local median cpu=""
     if command -v hyperfine >/dev/null; then
         local quoted=() arg
         for arg in "$@"; do quoted+=("$(printf '%q' "$arg")"); done
@@ -48,7 +50,7 @@ measure() {
             "$@" >/dev/null
             exit 1
         }
-        median=$(python3 -c 'import json,sys; print(json.load(open(sys.argv[1]))["results"][0]["median"]*1e3)' "$work/h.json")
+        read -r median cpu < <(python3 -c 'import json,sys; r=json.load(open(sys.argv[1]))["results"][0]; print(r["median"]*1e3, (r["user"]+r["system"])*1e3)' "$work/h.json")
     else
         local times=() i s e
         for ((i = 0; i < 3; i++)); do [ -n "$prepare" ] && eval "$prepare"; "$@" >/dev/null 2>&1 || true; done
@@ -61,7 +63,7 @@ measure() {
         done
         median=$(printf '%s\n' "${times[@]}" | sort -g | awk '{a[NR]=$1} END {print (NR%2 ? a[(NR+1)/2] : (a[NR/2]+a[NR/2+1])/2)}')
     fi
-    printf '%s\t%s\n' "$name" "$median" >>"$results"
+    printf '%s\t%s\t%s\n' "$name" "$median" "$cpu" >>"$results"
 }
 
 hosts=$work/hosts
@@ -139,29 +141,34 @@ measure "batch: $lines read lines" "$(runs 5)" "" "$cli" --state="$default" --ba
 python3 - "$results" "$writes" "$lines" "$hosts" <<'PY'
 import os, sys
 rows = [line.rstrip("\n").split("\t") for line in open(sys.argv[1])]
-t = {name: float(ms) for name, ms in rows}
+t = {r[0]: float(r[1]) for r in rows}
+c = {r[0]: float(r[2]) for r in rows if len(r) > 2 and r[2]}
+def cpu(name, base=None):
+    if name not in c: return ""
+    return f"  cpu {c[name]:7.2f}" + (f" x{c[name] / c[base]:5.2f}" if base in c else "")
 writes, lines, hosts = sys.argv[2], int(sys.argv[3]), sys.argv[4]
 true = t["ref /bin/true"]
-print(f"Machine: {os.cpu_count()} CPUs; medians in ms, ratios to /bin/true")
+print(f"Machine: {os.cpu_count()} CPUs; wall: median ms, ratio to /bin/true; cpu: mean user+system ms, ratio")
 print("\nDefault host")
 for name, ms in t.items():
     if name.startswith(("ref ", "default ")):
-        print(f"  {name:<72} {ms:8.2f}  x{ms / true:5.2f}")
+        print(f"  {name:<72} {ms:8.2f}  x{ms / true:5.2f}{cpu(name, 'ref /bin/true')}")
 print("\nScale-1 host (target: every command under 25 ms)")
 scale = {n: v for n, v in t.items() if n.startswith("scale-1 ")}
 for name, ms in sorted(scale.items(), key=lambda x: -x[1]):
-    print(f"  {name:<72} {ms:8.2f}{'  OVER' if ms >= 25 else ''}")
+    print(f"  {name:<72} {ms:8.2f}{cpu(name)}{'  OVER' if ms >= 25 else ''}")
 print(f"  slowest: {max(scale.values()):.2f} ms")
 if writes:
     print(f"  state file writes (renames) of one change: {writes}")
-print("\nGrowth (ms; ratio to scale 1; state file size)")
+growthOf = (lambda n: c[n]) if c else (lambda n: t[n])
+print(f"\nGrowth ({'cpu' if c else 'wall'} ms; ratio to scale 1; state file size)")
 scales = ["0.25", "0.5", "1", "2", "4"]
 sizes = {s: os.path.getsize(f"{hosts}/scale-{s}.json") for s in scales}
 print("  " + " " * 44 + "".join(f"{s:>14}" for s in scales))
 print("  " + f"{'state file (MB)':<44}" + "".join(f"{sizes[s] / 1e6:14.2f}" for s in scales))
 for line in sorted({n.split(": ", 1)[1] for n in t if n.startswith("growth ")}):
-    row = [t[f"growth {s}: {line}"] for s in scales]
-    base = t[f"growth 1: {line}"]
+    row = [growthOf(f"growth {s}: {line}") for s in scales]
+    base = growthOf(f"growth 1: {line}")
     print("  " + f"{line:<44}" + "".join(f"{v:8.2f} x{v / base:4.2f}" for v in row))
 b = t[f"batch: {lines} read lines"]
 print(f"\nBatch: {lines} read lines in {b:.0f} ms: {lines / b * 1000:,.0f} commands/s")

@@ -2,6 +2,7 @@
 # Configures and builds the project.
 #   scripts/build.sh              release build in build/
 #   scripts/build.sh --sanitize   AddressSanitizer + UndefinedBehaviorSanitizer build in build-asan/
+#                                 (with clang, which also builds the fuzz targets)
 set -euo pipefail
 root=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
 "$root/scripts/install-deps.sh"
@@ -10,7 +11,11 @@ dir="$root/build"
 args=(-DCMAKE_BUILD_TYPE=Release)
 while [ $# -gt 0 ]; do
     case "$1" in
-        --sanitize) dir="$root/build-asan"; args=(-DCMAKE_BUILD_TYPE=Debug -DHADRO_SANITIZE=ON) ;;
+        --sanitize)
+            dir="$root/build-asan"
+            args=(-DCMAKE_BUILD_TYPE=Debug -DHADRO_SANITIZE=ON)
+            if command -v clang++ >/dev/null; then args+=(-DCMAKE_C_COMPILER=clang -DCMAKE_CXX_COMPILER=clang++); fi
+            ;;
         --dir) dir="$2"; shift ;;
         *) args+=("$1") ;;
     esac

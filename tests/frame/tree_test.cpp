@@ -126,7 +126,9 @@ TEST(Tree, EveryCommandIsRegisteredOnce) {
     ASSERT_NE(get, nullptr);
     ASSERT_NE(list, nullptr);
     EXPECT_NE(get, list);
-    EXPECT_EQ(typeid(*get), typeid(*list));
+    const Zorbel::AutoCli::Command& getCommand = *get;
+    const Zorbel::AutoCli::Command& listCommand = *list;
+    EXPECT_EQ(typeid(getCommand), typeid(listCommand));
     EXPECT_EQ(get->GetDescription(), list->GetDescription());
     auto a = get->GetInputSpec()->GetParameters();
     auto b = list->GetInputSpec()->GetParameters();

@@ -346,7 +346,8 @@ TEST_F(SweepTest, SampleThroughHadrocli) {
     const std::string state = (dir / "host.json").string();
     ASSERT_EQ(RunHadrocli({"--state=" + state, "network", "ip", "get"}, dir).status, 0);
     std::string before = ReadAll(state);
-    std::size_t step = 37, runs = 0;  // every 37th case: each kind of value, spread over the commands
+    // Every SWEEP_PROCESS_STEP-th case (a prime): each kind of value, spread over the commands.
+    std::size_t step = SWEEP_PROCESS_STEP, runs = 0;
     for (std::size_t i = 0; i < cases.size(); i += step) {
         auto args = cases[i].args;
         for (auto& arg : args) {

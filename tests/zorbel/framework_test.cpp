@@ -173,7 +173,9 @@ TEST(CommandLine, PathsNamespacesAndGlobalOptions) {
 
     r = Cli({"--formatter=xmlish", "test"});
     EXPECT_EQ(r.status, EXIT_REFUSED);
-    EXPECT_EQ(r.err, "unknown formatter 'xmlish' for --formatter (choose from simple, table, json, xml, csv, keyvalue)");
+    EXPECT_EQ(
+        r.err,
+        "unknown formatter 'xmlish' for --formatter (choose from simple, table, json, xml, csv, keyvalue)");
     EXPECT_EQ(Cli({"--state"}).status, EXIT_REFUSED);
     EXPECT_EQ(Cli({"--what"}).err, "unknown global option --what");
 
@@ -321,7 +323,8 @@ TEST(Formatters, TextFromTheHostCannotDriveTheTerminal) {
     // Control characters and stray bytes are shown as escapes by simple and table; JSON escapes
     // them its own way.
     EXPECT_EQ(Cli({"test", "scalar", "raw"}).out, "tab\\there \\x1b[31m\\xff end\n");
-    EXPECT_EQ(Zorbel::Format::TerminalSafe("a\r\nb\x7f\xc2\x9b[2J\xc3\xa9"), "a\\r\\nb\\x7f\\u009b[2J\xc3\xa9");
+    EXPECT_EQ(Zorbel::Format::TerminalSafe("a\r\nb\x7f\xc2\x9b[2J\xc3\xa9"),
+              "a\\r\\nb\\x7f\\u009b[2J\xc3\xa9");
     EXPECT_EQ(Zorbel::Format::TerminalSafe("plain text"), "plain text");
     std::string json;
     Zorbel::Format::AppendJsonString(json, "\xc2\x9b\xe2\x82");

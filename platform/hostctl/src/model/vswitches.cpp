@@ -20,22 +20,42 @@ VSwitch* VSwitchesSection::Find(const std::string& name) {
     return const_cast<VSwitch*>(static_cast<const VSwitchesSection*>(this)->Find(name));
 }
 
-const VSwitch* VSwitchesSection::FindPortGroupSwitch(const std::string& portGroup) const {
-    for (const auto& vswitch : switches) {
-        for (const auto& group : vswitch.portGroups) {
-            if (group.name == portGroup) return &vswitch;
+namespace {
+
+// The port group of that name and its switch, or nullptrs. Port groups are looked up by name
+// for every port, interface and property read: a host with thousands of them must not scan
+// them all each time.
+std::pair<const VSwitch*, const PortGroup*> LocatePortGroup(const VSwitchesSection& section,
+                                                            const std::string& name) {
+    auto lookup = [&]() -> std::pair<const VSwitch*, const PortGroup*> {
+        auto hit = section.groupIndex.find(name);
+        if (hit == section.groupIndex.end()) return {nullptr, nullptr};
+        auto [s, g] = hit->second;
+        if (s >= section.switches.size() || g >= section.switches[s].portGroups.size() ||
+            section.switches[s].portGroups[g].name != name) {
+            return {nullptr, nullptr};
         }
+        return {&section.switches[s], &section.switches[s].portGroups[g]};
+    };
+    if (auto found = lookup(); found.second) return found;
+    // An unknown name, or the switches changed since the index was made: index them again
+    // (the first of a name wins, as a scan would find it).
+    section.groupIndex.clear();
+    for (std::size_t s = 0; s < section.switches.size(); ++s) {
+        for (std::size_t g = 0; g < section.switches[s].portGroups.size(); ++g)
+            section.groupIndex.emplace(section.switches[s].portGroups[g].name, std::make_pair(s, g));
     }
-    return nullptr;
+    return lookup();
+}
+
+}  // namespace
+
+const VSwitch* VSwitchesSection::FindPortGroupSwitch(const std::string& portGroup) const {
+    return LocatePortGroup(*this, portGroup).first;
 }
 
 const PortGroup* VSwitchesSection::FindPortGroup(const std::string& portGroup) const {
-    for (const auto& vswitch : switches) {
-        for (const auto& group : vswitch.portGroups) {
-            if (group.name == portGroup) return &group;
-        }
-    }
-    return nullptr;
+    return LocatePortGroup(*this, portGroup).second;
 }
 
 PortGroup* VSwitchesSection::FindPortGroup(const std::string& portGroup) {

@@ -4,6 +4,8 @@
 
 #include <cstdint>
 #include <string>
+#include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "core/section.h"
@@ -58,6 +60,10 @@ struct VSwitchesSection {
     const VSwitch* FindPortGroupSwitch(const std::string& portGroup) const;
     const PortGroup* FindPortGroup(const std::string& portGroup) const;
     PortGroup* FindPortGroup(const std::string& portGroup);
+
+    // Where the port-group lookups last saw each group (switch and group positions). Every
+    // answer is checked against switches, so changes to them only cost a new index.
+    mutable std::unordered_map<std::string, std::pair<std::size_t, std::size_t>> groupIndex;
 };
 
 }  // namespace TknCtl::Model

@@ -204,4 +204,22 @@ TEST_F(Batch, RefusedInvocations) {
     EXPECT_EQ(ReadAll(state_), "{\"version\":1,");
 }
 
+TEST_F(Batch, HadrosimGeneratesAScaleHost) {
+    auto sim = [&](const std::string& args) {
+        std::string command = std::string(HADROSIM) + " --state=" + state_ + " " + args + " >/dev/null 2>&1";
+        int status = std::system(command.c_str());
+        return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    };
+    const std::string before = ReadAll(state_);
+    for (const char* bad :
+         {"generate", "generate --scale", "generate --scale 0", "generate --scale 17", "generate --scale 1x",
+          "generate --scale nan", "generate --scale 1 --scale 2", "generate --size 1"}) {
+        EXPECT_EQ(sim(bad), 2) << bad;
+    }
+    EXPECT_EQ(ReadAll(state_), before);
+    ASSERT_EQ(sim("generate --scale 0.05"), 0);
+    EXPECT_NE(Cli("network vm list").out.find("vm-00049"), std::string::npos);
+    EXPECT_EQ(sim("export"), 0);
+}
+
 }  // namespace

@@ -14,7 +14,7 @@ while [ $# -gt 0 ]; do
         --sanitize)
             dir="$root/build-asan"
             args=(-DCMAKE_BUILD_TYPE=Debug -DHADRO_SANITIZE=ON)
-            if command -v clang++ >/dev/null; then args+=(-DCMAKE_C_COMPILER=clang -DCMAKE_CXX_COMPILER=clang++); fi
+            if command -v clang++ >/dev/null; then args+=(-DCMAKE_CXX_COMPILER=clang++); fi
             ;;
         --dir) dir="$2"; shift ;;
         *) args+=("$1") ;;

@@ -4,7 +4,7 @@
 set -euo pipefail
 
 packages=(cmake g++ ninja-build libboost1.81-dev nlohmann-json3-dev libgtest-dev libgmock-dev
-          libbenchmark-dev clang libclang-rt-dev valgrind)
+          libbenchmark-dev clang libclang-rt-dev valgrind zsh)
 
 missing=()
 for p in "${packages[@]}"; do

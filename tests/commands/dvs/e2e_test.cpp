@@ -1,42 +1,16 @@
 // The distributed-switch commands through the real hadrocli and hadrosim on a state file.
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <string>
 
+#include "processes.h"
+
 namespace {
 
-class DvsEndToEnd : public ::testing::Test {
-protected:
-    void SetUp() override {
-        char dir[] = "/tmp/hadro-dvs-XXXXXX";
-        ASSERT_NE(mkdtemp(dir), nullptr);
-        dir_ = dir;
-    }
-    void TearDown() override { std::filesystem::remove_all(dir_); }
-
-    // Runs a program on the test's state file; returns the exit status and fills out (stdout
-    // and stderr together).
-    int Exec(const std::string& program, const std::string& args, std::string& out) {
-        std::string command = program + " --state=" + dir_ + "/host.json " + args + " 2>&1";
-        out.clear();
-        FILE* pipe = popen(command.c_str(), "r");
-        if (!pipe) return -1;
-        char buffer[4096];
-        for (std::size_t n; (n = fread(buffer, 1, sizeof buffer, pipe)) > 0;)
-            out.append(buffer, n);
-        int status = pclose(pipe);
-        return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    }
-    int Cli(const std::string& args, std::string& out) {
-        return Exec(HADROCLI, std::string("--plugin-dir=") + HADRO_PLUGIN_DIR + " " + args, out);
-    }
-
-    std::string dir_;
-};
+class DvsEndToEnd : public Hadro::Test::EndToEndTest {};
 
 TEST_F(DvsEndToEnd, TimeoutLastsAcrossRunsAndFaultsReachTheCommands) {
     std::string out;
@@ -51,8 +25,7 @@ TEST_F(DvsEndToEnd, TimeoutLastsAcrossRunsAndFaultsReachTheCommands) {
     EXPECT_EQ(Cli("network vswitch dvs talvex lacp timeout set -t true -n vmnic9 -l 1 -s dvs-prod", out), 1);
     EXPECT_EQ(out, "NIC vmnic9 is not a member of LAG 1 on distributed switch dvs-prod\n");
 
-    EXPECT_EQ(
-        Exec(HADROSIM, "fault add HostCtl::Network::Port::GetPacketStats --message 'stats locked'", out), 0);
+    EXPECT_EQ(Sim("fault add HostCtl::Network::Port::GetPacketStats --message 'stats locked'", out), 0);
     EXPECT_EQ(Cli("network port stats get -p 33554437", out), 1);
     EXPECT_EQ(out, "Unable to get stats for port: stats locked\n");
 }

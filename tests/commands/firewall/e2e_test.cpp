@@ -1,6 +1,5 @@
 // The firewall commands through the real programs, on a state file of their own.
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -9,50 +8,11 @@
 #include <sstream>
 #include <string>
 
+#include "processes.h"
+
 namespace {
 
-struct Outcome {
-    int status = -1;
-    std::string out;
-    std::string err;
-};
-
-class FirewallEndToEnd : public ::testing::Test {
-protected:
-    void SetUp() override {
-        char pattern[] = "/tmp/hadro-firewall-XXXXXX";
-        ASSERT_NE(mkdtemp(pattern), nullptr);
-        dir_ = pattern;
-        state_ = dir_ / "host.json";
-    }
-    void TearDown() override { std::filesystem::remove_all(dir_); }
-
-    // Runs a program with --state and the arguments (already quoted for the shell).
-    Outcome Exec(const std::string& program, const std::string& arguments) {
-        const auto out = dir_ / "out";
-        const auto err = dir_ / "err";
-        std::string command = "'" + program + "' --state='" + state_.string() + "' " + arguments + " >'" +
-                              out.string() + "' 2>'" + err.string() + "' </dev/null";
-        int raw = std::system(command.c_str());
-        Outcome outcome;
-        outcome.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
-        outcome.out = Slurp(out);
-        outcome.err = Slurp(err);
-        return outcome;
-    }
-    Outcome Cli(const std::string& arguments) { return Exec(HADROCLI, arguments); }
-    Outcome Sim(const std::string& arguments) { return Exec(HADROSIM, arguments); }
-
-    static std::string Slurp(const std::filesystem::path& path) {
-        std::ifstream in(path);
-        std::ostringstream text;
-        text << in.rdbuf();
-        return text.str();
-    }
-
-    std::filesystem::path dir_;
-    std::filesystem::path state_;
-};
+class FirewallEndToEnd : public Hadro::Test::EndToEndTest {};
 
 TEST_F(FirewallEndToEnd, UnloadLoadAndStatus) {
     auto r = Cli("network firewall unload");

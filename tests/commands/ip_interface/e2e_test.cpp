@@ -1,59 +1,16 @@
 // The interface commands through the real hadrocli and hadrosim on a state file.
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <string>
 
+#include "processes.h"
+
 namespace {
 
-class IpInterfaceEndToEnd : public ::testing::Test {
-protected:
-    void SetUp() override {
-        char dir[] = "/tmp/hadro-ipif-XXXXXX";
-        ASSERT_NE(mkdtemp(dir), nullptr);
-        dir_ = dir;
-    }
-    void TearDown() override { std::filesystem::remove_all(dir_); }
-
-    struct Outcome {
-        int status = -1;
-        std::string out;
-        std::string err;
-    };
-
-    Outcome Exec(const std::string& program, const std::string& args) {
-        const std::string errFile = dir_ + "/stderr";
-        std::string command = program + " --state=" + dir_ + "/host.json " + args + " 2>" + errFile;
-        Outcome outcome;
-        FILE* pipe = popen(command.c_str(), "r");
-        outcome.out = Read(pipe);
-        int status = pclose(pipe);
-        outcome.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-        FILE* file = std::fopen(errFile.c_str(), "r");
-        outcome.err = Read(file);
-        if (file) std::fclose(file);
-        return outcome;
-    }
-    Outcome Cli(const std::string& args) {
-        return Exec(HADROCLI, std::string("--plugin-dir=") + HADRO_PLUGIN_DIR + " " + args);
-    }
-    Outcome Sim(const std::string& args) { return Exec(HADROSIM, args); }
-
-    std::string dir_;
-
-private:
-    static std::string Read(FILE* file) {
-        std::string text;
-        if (!file) return text;
-        char buffer[4096];
-        for (std::size_t n; (n = std::fread(buffer, 1, sizeof buffer, file)) > 0;)
-            text.append(buffer, n);
-        return text;
-    }
-};
+class IpInterfaceEndToEnd : public Hadro::Test::EndToEndTest {};
 
 TEST_F(IpInterfaceEndToEnd, AnInterfaceLivesFromCreationToRemoval) {
     auto r = Cli("network ip interface add --portgroup-name 'VM Network' --interface-name tkn9 --mtu 9000");

@@ -42,8 +42,8 @@ bool IsFormatter(const std::string& name);
 // when the parameter is fine.
 std::string CheckFormatParameter(const std::string& key, std::string& value);
 
-// Checks the user's "fields" against the shape of a command's result (its output
-// specification's root): each name must be a field of the result's records. Returns an error
+// Checks the user's "fields" against the shape of a command's result (the root its OutputSpec
+// declares): each name must be a field of the result's records. Returns an error
 // text, empty when fine (or when no "fields" was given or the shape is unknown).
 std::string CheckFields(const OutputParameters& parameters, const MetaObj::MetaObject* shape);
 

@@ -1,9 +1,12 @@
 // hadrocli: runs one command line of the host's administrative CLI.
+#include <malloc.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <climits>
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
@@ -21,6 +24,40 @@ namespace {
 
 using Zorbel::AutoCli::Dispatcher;
 using Zorbel::AutoCli::GlobalOptions;
+
+// A command on a large host allocates tens of megabytes in small blocks (the state file, its
+// parsed sections, one record per row, the rendered table). Faulting that memory in one 4 KiB
+// page at a time costs more than the work itself where page faults are dear, as on virtual
+// machines. So large blocks stay in the heap instead of mappings of their own, the heap keeps
+// what it has grown to, and it is reserved in one step whose range the kernel may back with
+// huge pages. The heap's free space then starts at the first huge page of that range (a filler
+// block takes the space before it), so even a small command touches one huge page instead of
+// dozens of small ones. Where huge pages are not available the advice is simply refused.
+void PrepareHeap() {
+    constexpr std::size_t kMiB = std::size_t{1} << 20;
+    constexpr std::uintptr_t kHugePage = 2 * kMiB;
+    constexpr std::uintptr_t kPage = 4096;
+    constexpr std::size_t kProbe = kMiB;
+    mallopt(M_MMAP_THRESHOLD, static_cast<int>(32 * kMiB));
+    mallopt(M_TRIM_THRESHOLD, static_cast<int>(1024 * kMiB));
+    mallopt(M_TOP_PAD, static_cast<int>(256 * kMiB));
+    // More than the heap's free top: the heap grows by the pad now. The new top's header is
+    // written just past the probe, so the advised range starts beyond that page: a huge page
+    // cannot form where a small one is already in place.
+    void* probe = std::malloc(kProbe);
+    if (probe == nullptr) return;
+    const auto at = reinterpret_cast<std::uintptr_t>(probe);
+    const auto begin = (at + kProbe + 2 * kPage + kHugePage - 1) & ~(kHugePage - 1);
+    const auto end = reinterpret_cast<std::uintptr_t>(sbrk(0)) & ~(kHugePage - 1);
+    const bool advised = end > begin && begin - at <= 2 * kHugePage &&
+                         madvise(reinterpret_cast<void*>(begin), end - begin, MADV_HUGEPAGE) == 0;
+    std::free(probe);
+    if (!advised) return;
+    // The filler ends in the page before the advised range and stays allocated for the
+    // process's life; what is allocated next starts there.
+    [[maybe_unused]] static void* volatile filler;  // volatile: the block must really be allocated
+    filler = std::malloc(begin - kPage - at);
+}
 
 bool IsDirectory(const std::string& path) {
     struct stat info {};
@@ -301,6 +338,7 @@ int Main(int argc, char** argv) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    PrepareHeap();
     std::ios::sync_with_stdio(false);
     try {
         int status = Main(argc, argv);

@@ -109,14 +109,33 @@ OutputSpecPtr ListOutput(RecordPtr prototype) {
     return WithRoot(MakeList(std::move(prototype)));
 }
 
+namespace {
+
+// The empty scalar values: one of each, shared by every field that starts with it. A scalar
+// field is only ever replaced by SetField, never changed in place.
+const std::shared_ptr<MetaObj::MetaObject>& EmptyString() {
+    static const std::shared_ptr<MetaObj::MetaObject> empty = MetaObj::MetaString::New();
+    return empty;
+}
+const std::shared_ptr<MetaObj::MetaObject>& EmptyInt() {
+    static const std::shared_ptr<MetaObj::MetaObject> empty = MetaObj::MetaInt::New();
+    return empty;
+}
+const std::shared_ptr<MetaObj::MetaObject>& EmptyBool() {
+    static const std::shared_ptr<MetaObj::MetaObject> empty = MetaObj::MetaBool::New();
+    return empty;
+}
+
+}  // namespace
+
 Field StringField(std::string name) {
-    return {std::move(name), MetaObj::MetaString::New()};
+    return {std::move(name), EmptyString()};
 }
 Field IntField(std::string name) {
-    return {std::move(name), MetaObj::MetaInt::New()};
+    return {std::move(name), EmptyInt()};
 }
 Field BoolField(std::string name) {
-    return {std::move(name), MetaObj::MetaBool::New()};
+    return {std::move(name), EmptyBool()};
 }
 Field StringListField(std::string name) {
     return {std::move(name), MetaObj::MetaList::New(MetaObj::META_STRING)};
@@ -130,9 +149,17 @@ Field RecordListField(std::string name, RecordPtr prototype) {
 
 RecordPtr MakeRecord(const std::string& recordName, const std::vector<Field>& fields) {
     auto record = MetaObj::MetaStruct::New(recordName);
-    // Each record gets values of its own: the field list may be shared by many records.
-    for (const auto& field : fields)
-        record->SetField(field.name, field.empty->Clone());
+    record->Reserve(fields.size());
+    // Records and lists, which commands fill in place, are copied for each record: the field
+    // list may be shared by many records. Scalars are replaced, never changed: they are shared.
+    for (const auto& field : fields) {
+        const auto type = field.empty->GetType();
+        if (type == MetaObj::META_STRUCT || type == MetaObj::META_LIST) {
+            record->SetField(field.name, field.empty->Clone());
+        } else {
+            record->SetField(field.name, field.empty);
+        }
+    }
     return record;
 }
 

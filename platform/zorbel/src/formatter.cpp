@@ -230,12 +230,18 @@ public:
     // The text of a value inside a record: scalars, lists of strings joined by ", ", records
     // inline. With a field name, its unit is appended.
     std::string Scalar(const MetaObject* value, const std::string& record, const std::string& field) const {
+        return field.empty() ? Plain(value) : Cell(value, Unit(record, field));
+    }
+    // The unit of a record's field, if the output parameters give one.
+    std::optional<std::string> Unit(const std::string& record, const std::string& field) const {
+        return parameters_.Get("units:" + record + "." + field);
+    }
+    // The text of a value with its unit (looked up once per column by the caller).
+    std::string Cell(const MetaObject* value, const std::optional<std::string>& unit) const {
         std::string text = Plain(value);
-        if (!field.empty()) {
-            if (auto unit = parameters_.Get("units:" + record + "." + field)) {
-                text += ' ';
-                text += *unit;
-            }
+        if (unit) {
+            text += ' ';
+            text += *unit;
         }
         return text;
     }
@@ -428,31 +434,48 @@ public:
 private:
     void Table(const std::vector<const MetaStruct*>& records) {
         if (records.empty()) return;
-        // The columns are those of the first record; a later record's cell is looked up by name.
+        // The columns are those of the first record; a later record's cell is looked up by name
+        // (first where the first record has it: records of a list have the same fields).
         std::vector<std::string> columns;
-        for (const auto* field : layout_.ShownFields(*records.front()))
+        std::vector<std::size_t> places;
+        const auto& firstFields = records.front()->GetFields();
+        for (const auto* field : layout_.ShownFields(*records.front())) {
             columns.push_back(field->first);
+            places.push_back(static_cast<std::size_t>(field - firstFields.data()));
+        }
         if (columns.empty()) return;
         const std::string& recordName = records.front()->GetName();
+        std::vector<std::optional<std::string>> units;
+        for (const auto& column : columns)
+            units.push_back(layout_.Unit(recordName, column));
 
-        std::vector<std::vector<std::string>> rows;
-        rows.reserve(records.size());
-        for (const auto* record : records) {
-            std::vector<std::string> row;
-            row.reserve(columns.size());
-            for (const auto& column : columns) {
-                auto value = record->GetField(column);
-                row.push_back(value ? layout_.Scalar(value.get(), recordName, column) : std::string());
-            }
-            rows.push_back(std::move(row));
-        }
-
+        const std::size_t count = columns.size();
+        std::vector<std::string> cells;  // row by row
+        std::vector<std::size_t> cellWidths;
+        cells.reserve(records.size() * count);
+        cellWidths.reserve(records.size() * count);
         const bool header = ShowHeader(layout_.parameters());
-        std::vector<std::size_t> widths(columns.size());
-        for (std::size_t i = 0; i < columns.size(); ++i) {
+        std::vector<std::size_t> widths(count);
+        for (std::size_t i = 0; i < count; ++i)
             widths[i] = header ? DisplayWidth(columns[i]) : 0;
-            for (const auto& row : rows)
-                widths[i] = std::max(widths[i], DisplayWidth(row[i]));
+        for (const auto* record : records) {
+            const auto& fields = record->GetFields();
+            for (std::size_t i = 0; i < count; ++i) {
+                const MetaObject* value = nullptr;
+                if (places[i] < fields.size() && fields[places[i]].first == columns[i]) {
+                    value = fields[places[i]].second.get();
+                } else {
+                    for (const auto& field : fields) {
+                        if (field.first == columns[i]) {
+                            value = field.second.get();
+                            break;
+                        }
+                    }
+                }
+                cells.push_back(value ? layout_.Cell(value, units[i]) : std::string());
+                cellWidths.push_back(DisplayWidth(cells.back()));
+                widths[i] = std::max(widths[i], cellWidths.back());
+            }
         }
 
         bool wrapLast = layout_.parameters().Get("wrap-last").value_or("") == "true";
@@ -469,38 +492,50 @@ private:
         }
 
         std::vector<std::string> dashes;
-        for (std::size_t i = 0; i < columns.size(); ++i) {
-            dashes.emplace_back(i + 1 == columns.size() ? lastWidth : widths[i], '-');
+        std::vector<std::size_t> dashWidths;
+        for (std::size_t i = 0; i < count; ++i) {
+            dashes.emplace_back(i + 1 == count ? lastWidth : widths[i], '-');
+            dashWidths.push_back(dashes.back().size());
         }
         if (header) {
-            Row(columns, widths, lastStart, lastWidth, false);
-            Row(dashes, widths, lastStart, lastWidth, false);
+            std::vector<std::size_t> headWidths;
+            for (const auto& column : columns)
+                headWidths.push_back(DisplayWidth(column));
+            Row(columns.data(), headWidths.data(), count, widths, lastStart, lastWidth, false);
+            Row(dashes.data(), dashWidths.data(), count, widths, lastStart, lastWidth, false);
         }
-        for (const auto& row : rows)
-            Row(row, widths, lastStart, lastWidth, wrapLast);
+        for (std::size_t at = 0; at < cells.size(); at += count)
+            Row(&cells[at], &cellWidths[at], count, widths, lastStart, lastWidth, wrapLast);
     }
 
-    void Row(const std::vector<std::string>& cells, const std::vector<std::size_t>& widths,
-             std::size_t lastStart, std::size_t lastWidth, bool wrap) {
-        std::string line;
-        for (std::size_t i = 0; i + 1 < cells.size(); ++i) {
-            line += cells[i];
-            line.append(widths[i] - DisplayWidth(cells[i]) + 2, ' ');
+    // One row of count cells with their display widths.
+    void Row(const std::string* cells, const std::size_t* cellWidths, std::size_t count,
+             const std::vector<std::size_t>& widths, std::size_t lastStart, std::size_t lastWidth, bool wrap) {
+        const std::size_t lineStart = out_.size();
+        for (std::size_t i = 0; i + 1 < count; ++i) {
+            out_ += cells[i];
+            out_.append(widths[i] - cellWidths[i] + 2, ' ');
         }
-        std::vector<std::string> last;
-        if (wrap && DisplayWidth(cells.back()) > lastWidth) {
-            last = WrapText(cells.back(), lastWidth);
-        } else {
-            last.push_back(cells.back());
+        const std::string& last = cells[count - 1];
+        if (!wrap || cellWidths[count - 1] <= lastWidth) {
+            out_ += last;
+            TrimLine(lineStart);
+            return;
         }
-        for (std::size_t i = 0; i < last.size(); ++i) {
-            std::string text = i == 0 ? line : std::string(lastStart, ' ');
-            text += last[i];
-            while (!text.empty() && text.back() == ' ')
-                text.pop_back();
-            out_ += text;
-            out_ += '\n';
+        const auto pieces = WrapText(last, lastWidth);
+        for (std::size_t i = 0; i < pieces.size(); ++i) {
+            const std::size_t start = out_.size();
+            if (i > 0) out_.append(lastStart, ' ');
+            out_ += pieces[i];
+            TrimLine(i == 0 ? lineStart : start);
         }
+    }
+
+    // Ends the line begun at start, without the blanks at its end.
+    void TrimLine(std::size_t start) {
+        while (out_.size() > start && out_.back() == ' ')
+            out_.pop_back();
+        out_ += '\n';
     }
 
     Layout layout_;

@@ -111,6 +111,8 @@ public:
     }
 
     const std::vector<Field>& GetFields() const { return fields_; }
+    // Makes room for count fields (a record built field by field then grows only once).
+    void Reserve(std::size_t count) { fields_.reserve(count); }
     bool HasField(const std::string& field) const;
     // The value of a field, or null when the record has no such field.
     std::shared_ptr<MetaObject> GetField(const std::string& field) const;

@@ -510,7 +510,8 @@ private:
 
     // One row of count cells with their display widths.
     void Row(const std::string* cells, const std::size_t* cellWidths, std::size_t count,
-             const std::vector<std::size_t>& widths, std::size_t lastStart, std::size_t lastWidth, bool wrap) {
+             const std::vector<std::size_t>& widths, std::size_t lastStart, std::size_t lastWidth,
+             bool wrap) {
         const std::size_t lineStart = out_.size();
         for (std::size_t i = 0; i + 1 < count; ++i) {
             out_ += cells[i];

@@ -22,7 +22,8 @@ std::string Refusal(const std::string& text) {
 }
 
 TEST(StateParse, StringsDecodeEscapesAndKeepUtf8) {
-    Value v = Parse(R"(["a\"\\\/\b\f\n\r\t", "\u00e9\u20ac\ud83d\ude00", "é€😀", ""])", "s");
+    const auto document = Parse(R"(["a\"\\\/\b\f\n\r\t", "\u00e9\u20ac\ud83d\ude00", "é€😀", ""])", "s");
+    const Value& v = document.Root();
     ASSERT_TRUE(v.is_array());
     ASSERT_EQ(v.size(), 4u);
     EXPECT_EQ(v.Items()[0].String(), "a\"\\/\b\f\n\r\t");
@@ -69,8 +70,9 @@ TEST(StateParse, RefusesWhatIsNotStrictJson) {
 }
 
 TEST(StateParse, NumbersKeepTheirKind) {
-    Value v = Parse("[18446744073709551615, -9223372036854775808, -0, 18446744073709551616, 1.5, 2e3]", "s");
-    const auto& n = v.Items();
+    const auto numbers =
+        Parse("[18446744073709551615, -9223372036854775808, -0, 18446744073709551616, 1.5, 2e3]", "s");
+    const auto n = numbers.Root().Items();
     EXPECT_TRUE(n[0].is_number_unsigned());
     EXPECT_EQ(n[0].Unsigned(), 18446744073709551615ull);
     EXPECT_TRUE(n[1].is_number_integer());
@@ -82,8 +84,9 @@ TEST(StateParse, NumbersKeepTheirKind) {
         EXPECT_FALSE(n[static_cast<std::size_t>(i)].is_number_integer()) << i;
     EXPECT_DOUBLE_EQ(n[5].Double(), 2000);
     // Read as integers of a given width.
-    Value doc = Parse(R"({"small": 7, "negative": -1, "float": 2e3, "huge": 18446744073709551616})", "s");
-    In in(doc, "s");
+    const auto doc =
+        Parse(R"({"small": 7, "negative": -1, "float": 2e3, "huge": 18446744073709551616})", "s");
+    In in(doc.Root(), "s");
     EXPECT_EQ(in.Int<std::uint8_t>("small"), 7);
     EXPECT_EQ(in.Int<std::int32_t>("negative"), -1);
     auto refused = [&](auto read) {
@@ -101,12 +104,12 @@ TEST(StateParse, NumbersKeepTheirKind) {
 }
 
 TEST(StateParse, MembersAreReadOnceAndNeverTwice) {
-    Value doc = Parse(R"({"name": "a", "extra": 1})", "s");
-    In in(doc, "s");
+    const auto doc = Parse(R"({"name": "a", "extra": 1})", "s");
+    In in(doc.Root(), "s");
     EXPECT_EQ(in.Str("name"), "a");
     EXPECT_THROW(in.Done(), TknCtl::Lib::SectionFault);
-    Value twice = Parse(R"({"name": "a", "name": "b"})", "s");
-    In second(twice, "s");
+    const auto twice = Parse(R"({"name": "a", "name": "b"})", "s");
+    In second(twice.Root(), "s");
     EXPECT_EQ(second.Str("name"), "b");
     try {
         second.Done();

@@ -44,7 +44,7 @@ void In::RangeFail(long double min, long double max) const {
 
 std::string In::Str() const {
     if (!value_->is_string()) Fail("expected a string");
-    return value_->String();
+    return std::string(value_->String());
 }
 
 bool In::Bool() const {
@@ -109,25 +109,27 @@ std::vector<std::string> In::Strings(const char* key) const {
 void In::Done() const {
     if (!value_->is_object() || hits_ >= value_->size()) return;
     // Slow path, only when a member was not read: name the first such member.
-    const auto& keys = value_->Keys();
-    for (const auto& key : keys) {
+    const auto members = value_->Items();
+    for (const auto& member : members) {
         bool known = false;
         for (std::size_t i = 0; i < hits_ && i < seen_.size(); ++i) {
-            if (key == seen_[i]) known = true;
+            if (member.Key() == seen_[i]) known = true;
         }
-        if (!known) Fail("unknown member " + Lib::Quote(key));
+        if (!known) Fail("unknown member " + Lib::Quote(std::string(member.Key())));
     }
-    for (std::size_t i = 0; i < keys.size(); ++i) {
-        for (std::size_t j = i + 1; j < keys.size(); ++j) {
-            if (keys[i] == keys[j]) Fail("member " + Lib::Quote(keys[i]) + " appears twice");
+    for (std::size_t i = 0; i < members.size(); ++i) {
+        for (std::size_t j = i + 1; j < members.size(); ++j) {
+            if (members[i].Key() == members[j].Key())
+                Fail("member " + Lib::Quote(std::string(members[i].Key())) + " appears twice");
         }
     }
     Fail("unknown member");
 }
 
 const Value* Value::Find(std::string_view key) const {
-    for (std::size_t i = keys_.size(); i-- > 0;) {
-        if (keys_[i] == key) return &items_[i];
+    if (!is_object()) return nullptr;
+    for (std::size_t i = size_; i-- > 0;) {
+        if (u_.items[i].Key() == key) return &u_.items[i];
     }
     return nullptr;
 }
@@ -137,16 +139,14 @@ const Value* Value::Find(std::string_view key) const {
 // numbers become doubles. Nesting is limited so that no document can exhaust the stack.
 class Parser {
 public:
-    explicit Parser(std::string_view text)
-        : p_(text.data()), begin_(text.data()), end_(text.data() + text.size()) {}
+    Parser(std::string_view text, Document& document)
+        : p_(text.data()), begin_(text.data()), end_(text.data() + text.size()), document_(document) {}
 
-    Value Document() {
-        Value value;
+    void Parse() {
         Blanks();
-        ParseValue(value, 0);
+        ParseValue(document_.root_, 0);
         Blanks();
         if (p_ != end_) Fail("unexpected text after the value");
-        return value;
     }
 
 private:
@@ -178,18 +178,22 @@ private:
             case '[':
                 ParseArray(value, depth + 1);
                 return;
-            case '"':
+            case '"': {
                 value.kind_ = Value::Kind::kString;
-                ParseString(value.text_);
+                const std::string_view text = ParseString();
+                value.u_.text = text.data();
+                value.size_ = static_cast<std::uint32_t>(text.size());
                 return;
+            }
             case 't':
                 Literal("true", 4);
                 value.kind_ = Value::Kind::kBool;
-                value.boolean_ = true;
+                value.u_.boolean = true;
                 return;
             case 'f':
                 Literal("false", 5);
                 value.kind_ = Value::Kind::kBool;
+                value.u_.boolean = false;
                 return;
             case 'n':
                 Literal("null", 4);
@@ -200,57 +204,67 @@ private:
     }
 
     // The members or elements of a value at one depth are gathered in a scratch list that
-    // is kept from one value to the next, then moved into a vector of the exact size: one
-    // allocation per value instead of one per doubling.
+    // is kept from one value to the next, then copied side by side into the document.
     std::vector<Value>& ScratchItems(int depth) {
         auto at = static_cast<std::size_t>(depth);
-        if (scratchItems_.size() <= at) scratchItems_.resize(at + 1);
-        scratchItems_[at].clear();
-        return scratchItems_[at];
+        if (scratch_.size() <= at) scratch_.resize(at + 1);
+        scratch_[at].clear();
+        return scratch_[at];
     }
-    static void MoveInto(std::vector<Value>& from, std::vector<Value>& to) {
-        to.reserve(from.size());
-        for (auto& item : from)
-            to.push_back(std::move(item));
-        from.clear();
+    // Room for count values side by side, in blocks the document owns.
+    Value* Allocate(std::size_t count) {
+        if (count > room_) {
+            blockSize_ = std::min<std::size_t>(blockSize_ * 2, 65536);
+            const std::size_t size = std::max(count, blockSize_);
+            document_.blocks_.push_back(std::unique_ptr<Value[]>(new Value[size]));
+            next_ = document_.blocks_.back().get();
+            room_ = size;
+        }
+        Value* at = next_;
+        next_ += count;
+        room_ -= count;
+        return at;
+    }
+    void Close(Value& value, std::vector<Value>& items) {
+        if (items.size() > UINT32_MAX) Fail("too many values");
+        Value* at = Allocate(items.size());
+        std::copy(items.begin(), items.end(), at);
+        value.u_.items = at;
+        value.size_ = static_cast<std::uint32_t>(items.size());
+        items.clear();
     }
 
     void ParseObject(Value& value, int depth) {
         if (depth > kMaxDepth) Fail("nested too deeply");
         value.kind_ = Value::Kind::kObject;
+        value.u_.items = nullptr;
         ++p_;
         Blanks();
         if (p_ != end_ && *p_ == '}') {
             ++p_;
             return;
         }
-        auto at = static_cast<std::size_t>(depth);
-        if (scratchKeys_.size() <= at) scratchKeys_.resize(at + 1);
-        auto& keys = scratchKeys_[at];
-        keys.clear();
         auto& items = ScratchItems(depth);
         while (true) {
             Blanks();
             if (p_ == end_ || *p_ != '"')
                 Fail(p_ == end_ ? "unexpected end of text" : "expected a member name");
-            keys.emplace_back();
-            ParseString(keys.back());
+            const std::string_view key = ParseString();
             Blanks();
             Expect(':', "expected ':'");
             Blanks();
-            items.emplace_back();
-            ParseValue(items.back(), depth);
+            Value member;
+            ParseValue(member, depth);
+            member.key_ = key.data();
+            member.keySize_ = static_cast<std::uint32_t>(key.size());
+            items.push_back(member);
             Blanks();
             if (p_ != end_ && *p_ == ',') {
                 ++p_;
                 continue;
             }
             Expect('}', "expected ',' or '}'");
-            value.keys_.reserve(keys.size());
-            for (auto& key : keys)
-                value.keys_.push_back(std::move(key));
-            keys.clear();
-            MoveInto(items, value.items_);
+            Close(value, items);
             return;
         }
     }
@@ -258,6 +272,7 @@ private:
     void ParseArray(Value& value, int depth) {
         if (depth > kMaxDepth) Fail("nested too deeply");
         value.kind_ = Value::Kind::kArray;
+        value.u_.items = nullptr;
         ++p_;
         Blanks();
         if (p_ != end_ && *p_ == ']') {
@@ -267,15 +282,16 @@ private:
         auto& items = ScratchItems(depth);
         while (true) {
             Blanks();
-            items.emplace_back();
-            ParseValue(items.back(), depth);
+            Value element;
+            ParseValue(element, depth);
+            items.push_back(element);
             Blanks();
             if (p_ != end_ && *p_ == ',') {
                 ++p_;
                 continue;
             }
             Expect(']', "expected ',' or ']'");
-            MoveInto(items, value.items_);
+            Close(value, items);
             return;
         }
     }
@@ -340,8 +356,35 @@ private:
         return 0;
     }
 
-    void ParseString(std::string& out) {
+    // A string starting at p_ ('"'): a view of the text when it has no escapes, else of its
+    // decoded copy, kept by the document.
+    std::string_view ParseString() {
         ++p_;  // the opening quote
+        const char* start = p_;
+        while (p_ != end_) {
+            const auto c = static_cast<unsigned char>(*p_);
+            if (c == '"') {
+                ++p_;
+                return {start, static_cast<std::size_t>(p_ - 1 - start)};
+            }
+            if (c == '\\') break;
+            if (c < 0x20) Fail("control character in a string");
+            if (c < 0x80) {
+                ++p_;
+                continue;
+            }
+            const std::size_t length = Utf8Length();
+            if (!length) Fail("a string is not valid UTF-8");
+            p_ += length;
+        }
+        if (p_ == end_) Fail("a string is not closed");
+        std::string& out = document_.decoded_.emplace_back(start, static_cast<std::size_t>(p_ - start));
+        DecodeString(out);
+        return out;
+    }
+
+    // The rest of a string, from p_, decoded into out.
+    void DecodeString(std::string& out) {
         while (true) {
             // Plain bytes in one go.
             const char* start = p_;
@@ -452,7 +495,7 @@ private:
                 auto [at, error] = std::from_chars(start, p_, v);
                 if (error == std::errc() && at == p_) {
                     value.kind_ = Value::Kind::kInt;
-                    value.integer_ = v;
+                    value.u_.integer = v;
                     return;
                 }
             } else {
@@ -460,30 +503,34 @@ private:
                 auto [at, error] = std::from_chars(start, p_, v);
                 if (error == std::errc() && at == p_) {
                     value.kind_ = Value::Kind::kUnsigned;
-                    value.unsigned_ = v;
-                    value.integer_ = static_cast<std::int64_t>(v);
+                    value.u_.unsigned_ = v;
                     return;
                 }
             }
         }
         value.kind_ = Value::Kind::kDouble;
-        value.double_ = std::strtod(std::string(start, p_).c_str(), nullptr);
+        value.u_.real = std::strtod(std::string(start, p_).c_str(), nullptr);
     }
 
     const char* p_;
     const char* begin_;
     const char* end_;
+    Document& document_;
+    Value* next_ = nullptr;
+    std::size_t room_ = 0;
+    std::size_t blockSize_ = 128;
     // By depth; a deque, so that the lists of outer values stay where they are.
-    std::deque<std::vector<Value>> scratchItems_;
-    std::deque<std::vector<std::string>> scratchKeys_;
+    std::deque<std::vector<Value>> scratch_;
 };
 
-Value Parse(std::string_view text, const char* sectionName) {
+Document Parse(std::string_view text, const char* sectionName) {
+    Document document;
     try {
-        return Parser(text).Document();
+        Parser(text, document).Parse();
     } catch (const Lib::SectionFault& e) {
         throw Lib::SectionFault(std::string(sectionName) + ": not valid JSON: " + Lib::Printable(e.what()));
     }
+    return document;
 }
 
 std::string Dump(const Node& node) {

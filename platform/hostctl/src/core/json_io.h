@@ -9,9 +9,12 @@
 
 #include <array>
 #include <cstdint>
+#include <deque>
 #include <limits>
+#include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <type_traits>
@@ -25,7 +28,10 @@ using Node = nlohmann::ordered_json;  // output, members in insertion order
 
 // A parsed JSON value. Reading the state is what every command pays for, in proportion to
 // the size of the sections it touches: this representation and its parser (Parse) are made
-// for that, with objects as flat lists of members (a section's objects are small).
+// for that. A value is small and flat: strings and member names point into the parsed text
+// (or, when they had escapes, into text the Document decoded), and the elements of an array
+// or the members of an object lie side by side in memory the Document owns. A value lives
+// as long as its Document and the text it was parsed from.
 class Value {
 public:
     enum class Kind : std::uint8_t { kNull, kBool, kInt, kUnsigned, kDouble, kString, kArray, kObject };
@@ -38,29 +44,49 @@ public:
     // Any integer; an unsigned one is a non-negative integer.
     bool is_number_integer() const { return kind_ == Kind::kInt || kind_ == Kind::kUnsigned; }
     bool is_number_unsigned() const { return kind_ == Kind::kUnsigned; }
-    bool Boolean() const { return boolean_; }
-    std::int64_t Integer() const { return integer_; }
-    std::uint64_t Unsigned() const { return unsigned_; }
-    double Double() const { return double_; }
-    const std::string& String() const { return text_; }
-    // Elements of an array, values of an object's members.
-    const std::vector<Value>& Items() const { return items_; }
-    // Names of an object's members, in document order (Items() holds their values).
-    const std::vector<std::string>& Keys() const { return keys_; }
-    std::size_t size() const { return items_.size(); }
+    bool Boolean() const { return kind_ == Kind::kBool && u_.boolean; }
+    std::int64_t Integer() const { return is_number_integer() ? u_.integer : 0; }
+    std::uint64_t Unsigned() const { return kind_ == Kind::kUnsigned ? u_.unsigned_ : 0; }
+    double Double() const { return kind_ == Kind::kDouble ? u_.real : 0; }
+    std::string_view String() const {
+        return is_string() ? std::string_view(u_.text, size_) : std::string_view();
+    }
+    // Elements of an array, values of an object's members (each knows its name: Key()).
+    std::span<const Value> Items() const {
+        return is_array() || is_object() ? std::span<const Value>(u_.items, size_) : std::span<const Value>();
+    }
+    // The member name of a value inside an object; empty elsewhere.
+    std::string_view Key() const { return {key_, keySize_}; }
+    std::size_t size() const { return is_array() || is_object() ? size_ : 0; }
     // The value of a member (the last one, were the name given twice), or nullptr.
     const Value* Find(std::string_view key) const;
 
 private:
     friend class Parser;
     Kind kind_ = Kind::kNull;
-    bool boolean_ = false;
-    std::int64_t integer_ = 0;
-    std::uint64_t unsigned_ = 0;
-    double double_ = 0;
-    std::string text_;
-    std::vector<Value> items_;
-    std::vector<std::string> keys_;
+    std::uint32_t size_ = 0;  // of a string, an array or an object
+    std::uint32_t keySize_ = 0;
+    const char* key_ = nullptr;
+    union {
+        std::uint64_t unsigned_ = 0;
+        std::int64_t integer;
+        double real;
+        bool boolean;
+        const char* text;
+        const Value* items;
+    } u_;
+};
+
+// The result of Parse: the root value and the memory its parts live in.
+class Document {
+public:
+    const Value& Root() const { return root_; }
+
+private:
+    friend class Parser;
+    Value root_;
+    std::vector<std::unique_ptr<Value[]>> blocks_;
+    std::deque<std::string> decoded_;  // strings and names that had escapes
 };
 
 class In {
@@ -156,8 +182,9 @@ private:
     mutable std::array<const char*, 48> seen_;  // the keys read, for naming an unknown one
 };
 
-// Parses text into a value; a syntax error becomes a SectionFault naming the section.
-Value Parse(std::string_view text, const char* sectionName);
+// Parses text into a document; a syntax error becomes a SectionFault naming the section. The
+// document's values point into text, which must outlive it.
+Document Parse(std::string_view text, const char* sectionName);
 // Compact text of a node; strings that are not valid UTF-8 are repaired, never refused.
 std::string Dump(const Node& node);
 
@@ -211,9 +238,9 @@ public:
         : SectionKind(name), load_(load), save_(save), check_(check) {}
 
     std::unique_ptr<Lib::SectionData> Parse(std::string_view text) const override {
-        Value value = Json::Parse(text, Name());
+        const Document document = Json::Parse(text, Name());
         auto data = std::make_unique<Lib::SectionValue<T>>();
-        In in(value, Name());
+        In in(document.Root(), Name());
         load_(in, data->value);
         return data;
     }

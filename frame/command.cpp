@@ -147,19 +147,31 @@ Field RecordListField(std::string name, RecordPtr prototype) {
     return {std::move(name), MakeList(std::move(prototype))};
 }
 
+namespace {
+
+// Records and lists, which commands fill in place, are copied for each record: a field list
+// or prototype serves many records. Scalars are replaced, never changed: they are shared.
+std::shared_ptr<MetaObj::MetaObject> EmptyOfItsOwn(const std::shared_ptr<MetaObj::MetaObject>& empty) {
+    const auto type = empty->GetType();
+    return type == MetaObj::META_STRUCT || type == MetaObj::META_LIST ? empty->Clone() : empty;
+}
+
+}  // namespace
+
 RecordPtr MakeRecord(const std::string& recordName, const std::vector<Field>& fields) {
     auto record = MetaObj::MetaStruct::New(recordName);
     record->Reserve(fields.size());
-    // Records and lists, which commands fill in place, are copied for each record: the field
-    // list may be shared by many records. Scalars are replaced, never changed: they are shared.
-    for (const auto& field : fields) {
-        const auto type = field.empty->GetType();
-        if (type == MetaObj::META_STRUCT || type == MetaObj::META_LIST) {
-            record->SetField(field.name, field.empty->Clone());
-        } else {
-            record->SetField(field.name, field.empty);
-        }
-    }
+    for (const auto& field : fields)
+        record->SetField(field.name, EmptyOfItsOwn(field.empty));
+    return record;
+}
+
+RecordPtr RecordMaker::New() const {
+    auto record = MetaObj::MetaStruct::New(prototype_->GetName());
+    const auto& fields = prototype_->GetFields();
+    record->Reserve(fields.size());
+    for (const auto& [name, empty] : fields)
+        record->SetField(name, EmptyOfItsOwn(empty));
     return record;
 }
 

@@ -123,6 +123,17 @@ RecordPtr MakeRecord(const std::string& recordName, const std::vector<Field>& fi
 // A new empty list of records of that prototype.
 ListPtr MakeList(RecordPtr prototype);
 
+// Makes the records of a long listing: the shape (a command's GetOutputStructure) is built
+// once, and each New() record is what MakeRecord would give for it.
+class RecordMaker {
+public:
+    explicit RecordMaker(RecordPtr prototype) : prototype_(std::move(prototype)) {}
+    RecordPtr New() const;
+
+private:
+    RecordPtr prototype_;
+};
+
 // Sets the boolean root value.
 void SetResult(const OutputPtr& output, bool value);
 

@@ -63,6 +63,7 @@ void IpConnectionList::ExecuteInternal(InputPtr input, OutputPtr output) {
         TknCtl::Network::NetworkInfoImpl networkInfo;
         TknCtl::Resource::ResourceInfoImpl resources;
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         using Query = void (TknCtl::Network::NetworkInfoImpl::*)(
             std::vector<HostCtl::Network::TcpIpConnection>&, const std::string&);
         const std::pair<const char*, Query> queries[] = {
@@ -75,7 +76,7 @@ void IpConnectionList::ExecuteInternal(InputPtr input, OutputPtr output) {
             std::vector<HostCtl::Network::TcpIpConnection> connections;
             (networkInfo.*query)(connections, netstack);
             for (const auto& c : connections) {
-                auto record = GetOutputStructure();
+                auto record = rows.New();
                 record->SetField("Proto", proto);
                 record->SetField("Recv Q", c.recvQ);
                 record->SetField("Send Q", c.sendQ);

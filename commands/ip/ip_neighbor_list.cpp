@@ -57,8 +57,9 @@ void IpNeighborList::ExecuteInternal(InputPtr input, OutputPtr output) {
             }
         }
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         auto add = [&](const auto& entry, const std::string& state, const std::string& type) {
-            auto record = GetOutputStructure();
+            auto record = rows.New();
             record->SetField("Neighbor", entry.address.GetStringAddress());
             record->SetField("Mac Address", entry.linkLayerAddress);
             record->SetField("Tknnic", entry.interfaceName);

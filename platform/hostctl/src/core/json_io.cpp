@@ -1,5 +1,6 @@
 #include "core/json_io.h"
 
+#include <bit>
 #include <charconv>
 #include <cmath>
 #include <cstdio>
@@ -56,8 +57,12 @@ const Value* In::Find(const char* key) const {
     if (!value_->is_object()) Fail("expected an object");
     const Value* member = value_->Find(key);
     if (!member) return nullptr;
-    if (hits_ < seen_.size()) seen_[hits_] = key;
-    ++hits_;
+    const auto index = static_cast<std::size_t>(member - value_->Items().data());
+    if (index < 64) {
+        read_ |= std::uint64_t{1} << index;
+    } else {
+        ++readBeyond_;
+    }
     return member;
 }
 
@@ -107,21 +112,25 @@ std::vector<std::string> In::Strings(const char* key) const {
 }
 
 void In::Done() const {
-    if (!value_->is_object() || hits_ >= value_->size()) return;
-    // Slow path, only when a member was not read: name the first such member.
+    if (!value_->is_object()) return;
+    const auto read = static_cast<std::size_t>(std::popcount(read_)) + readBeyond_;
+    if (read >= value_->size()) return;
+    // Slow path, only when a member was not read: name the first that no read member names
+    // (an unknown one), else the first whose name a read one has (given twice).
     const auto members = value_->Items();
-    for (const auto& member : members) {
-        bool known = false;
-        for (std::size_t i = 0; i < hits_ && i < seen_.size(); ++i) {
-            if (member.Key() == seen_[i]) known = true;
+    auto wasRead = [&](std::size_t i) { return i < 64 && (read_ >> i & 1) != 0; };
+    auto nameRead = [&](std::string_view key) {
+        for (std::size_t i = 0; i < members.size() && i < 64; ++i) {
+            if (wasRead(i) && members[i].Key() == key) return true;
         }
-        if (!known) Fail("unknown member " + Lib::Quote(std::string(member.Key())));
+        return false;
+    };
+    for (std::size_t i = 0; i < members.size() && i < 64; ++i) {
+        if (!wasRead(i) && !nameRead(members[i].Key()))
+            Fail("unknown member " + Lib::Quote(std::string(members[i].Key())));
     }
-    for (std::size_t i = 0; i < members.size(); ++i) {
-        for (std::size_t j = i + 1; j < members.size(); ++j) {
-            if (members[i].Key() == members[j].Key())
-                Fail("member " + Lib::Quote(std::string(members[i].Key())) + " appears twice");
-        }
+    for (std::size_t i = 0; i < members.size() && i < 64; ++i) {
+        if (!wasRead(i)) Fail("member " + Lib::Quote(std::string(members[i].Key())) + " appears twice");
     }
     Fail("unknown member");
 }

@@ -7,7 +7,6 @@
 // object must be read (once) before Done(), so misspelt keys are refused.
 #pragma once
 
-#include <array>
 #include <cstdint>
 #include <deque>
 #include <limits>
@@ -178,8 +177,9 @@ private:
     const char* name_ = nullptr;  // root only
     const char* key_ = nullptr;   // member of an object, else element of an array
     std::size_t index_ = 0;
-    mutable std::size_t hits_ = 0;
-    mutable std::array<const char*, 48> seen_;  // the keys read, for naming an unknown one
+    // The members read: by position for the first 64, counted beyond.
+    mutable std::uint64_t read_ = 0;
+    mutable std::size_t readBeyond_ = 0;
 };
 
 // Parses text into a document; a syntax error becomes a SectionFault naming the section. The

@@ -385,6 +385,7 @@ int Dispatcher::Execute(const Invocation& invocation, const GlobalOptions& optio
                         std::ostream& err) {
     std::string rendered;
     std::shared_ptr<CallSpec::Output> output;
+    last_.reset();
     try {
         output = ExecuteRaw(invocation);
         if (const auto& root = output->GetRootObject()) {
@@ -413,6 +414,7 @@ int Dispatcher::Execute(const Invocation& invocation, const GlobalOptions& optio
         messages += '\n';
     }
     err << messages;
+    if (keepLast_) last_ = output;
     return StatusOf(*output);
 }
 

@@ -388,7 +388,7 @@ private:
 
 // ---------------------------------------------------------------- table
 
-std::size_t DisplayWidth(const std::string& text) {
+std::size_t DisplayWidth(std::string_view text) {
     // Counts code points, not bytes, so that UTF-8 text lines up.
     std::size_t width = 0;
     for (unsigned char c : text) {
@@ -450,9 +450,12 @@ private:
             units.push_back(layout_.Unit(recordName, column));
 
         const std::size_t count = columns.size();
-        std::vector<std::string> cells;  // row by row
+        // The cells row by row: their text one after another in one string (a cell ends where
+        // the next begins), their display widths.
+        std::string cellText;
+        std::vector<std::size_t> cellEnds;
         std::vector<std::size_t> cellWidths;
-        cells.reserve(records.size() * count);
+        cellEnds.reserve(records.size() * count);
         cellWidths.reserve(records.size() * count);
         const bool header = ShowHeader(layout_.parameters());
         std::vector<std::size_t> widths(count);
@@ -472,8 +475,10 @@ private:
                         }
                     }
                 }
-                cells.push_back(value ? layout_.Cell(value, units[i]) : std::string());
-                cellWidths.push_back(DisplayWidth(cells.back()));
+                const std::size_t start = cellText.size();
+                if (value) cellText += layout_.Cell(value, units[i]);
+                cellEnds.push_back(cellText.size());
+                cellWidths.push_back(DisplayWidth(std::string_view(cellText).substr(start)));
                 widths[i] = std::max(widths[i], cellWidths.back());
             }
         }
@@ -501,15 +506,25 @@ private:
             std::vector<std::size_t> headWidths;
             for (const auto& column : columns)
                 headWidths.push_back(DisplayWidth(column));
-            Row(columns.data(), headWidths.data(), count, widths, lastStart, lastWidth, false);
-            Row(dashes.data(), dashWidths.data(), count, widths, lastStart, lastWidth, false);
+            const std::vector<std::string_view> heads(columns.begin(), columns.end());
+            const std::vector<std::string_view> rules(dashes.begin(), dashes.end());
+            Row(heads.data(), headWidths.data(), count, widths, lastStart, lastWidth, false);
+            Row(rules.data(), dashWidths.data(), count, widths, lastStart, lastWidth, false);
         }
-        for (std::size_t at = 0; at < cells.size(); at += count)
-            Row(&cells[at], &cellWidths[at], count, widths, lastStart, lastWidth, wrapLast);
+        // Room for every line at its widest (wrapped lines may still need more).
+        out_.reserve(out_.size() + (records.size() + 2) * (lastStart + lastWidth + 1));
+        std::vector<std::string_view> row(count);
+        for (std::size_t at = 0; at < cellEnds.size(); at += count) {
+            for (std::size_t i = 0; i < count; ++i) {
+                const std::size_t start = at + i == 0 ? 0 : cellEnds[at + i - 1];
+                row[i] = std::string_view(cellText).substr(start, cellEnds[at + i] - start);
+            }
+            Row(row.data(), &cellWidths[at], count, widths, lastStart, lastWidth, wrapLast);
+        }
     }
 
     // One row of count cells with their display widths.
-    void Row(const std::string* cells, const std::size_t* cellWidths, std::size_t count,
+    void Row(const std::string_view* cells, const std::size_t* cellWidths, std::size_t count,
              const std::vector<std::size_t>& widths, std::size_t lastStart, std::size_t lastWidth,
              bool wrap) {
         const std::size_t lineStart = out_.size();
@@ -517,13 +532,13 @@ private:
             out_ += cells[i];
             out_.append(widths[i] - cellWidths[i] + 2, ' ');
         }
-        const std::string& last = cells[count - 1];
+        const std::string_view last = cells[count - 1];
         if (!wrap || cellWidths[count - 1] <= lastWidth) {
             out_ += last;
             TrimLine(lineStart);
             return;
         }
-        const auto pieces = WrapText(last, lastWidth);
+        const auto pieces = WrapText(std::string(last), lastWidth);
         for (std::size_t i = 0; i < pieces.size(); ++i) {
             const std::size_t start = out_.size();
             if (i > 0) out_.append(lastStart, ' ');

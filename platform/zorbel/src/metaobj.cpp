@@ -1,5 +1,6 @@
 #include "zorbel/metaobj.h"
 
+#include <cstring>
 #include <stdexcept>
 
 namespace Zorbel::MetaObj {
@@ -49,9 +50,19 @@ std::shared_ptr<MetaObject> MetaStruct::Clone() const {
     return copy;
 }
 
+namespace {
+
+// Field names are short and mostly differ in length or first letter: those are checked first.
+inline bool SameName(const std::string& a, const std::string& b) {
+    return a.size() == b.size() &&
+           (a.empty() || (a[0] == b[0] && std::memcmp(a.data(), b.data(), a.size()) == 0));
+}
+
+}  // namespace
+
 void MetaStruct::SetField(const std::string& field, std::shared_ptr<MetaObject> value) {
     for (auto& entry : fields_) {
-        if (entry.first == field) {
+        if (SameName(entry.first, field)) {
             entry.second = std::move(value);
             return;
         }
@@ -106,7 +117,7 @@ bool MetaStruct::HasField(const std::string& field) const {
 
 std::shared_ptr<MetaObject> MetaStruct::GetField(const std::string& field) const {
     for (const auto& entry : fields_) {
-        if (entry.first == field) return entry.second;
+        if (SameName(entry.first, field)) return entry.second;
     }
     return nullptr;
 }

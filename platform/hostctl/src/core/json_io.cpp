@@ -7,6 +7,9 @@
 #include <cstdlib>
 #include <cstring>
 #include <deque>
+#if defined(__SSE2__)
+#include <emmintrin.h>
+#endif
 
 #include "core/text.h"
 
@@ -55,9 +58,19 @@ bool In::Bool() const {
 
 const Value* In::Find(const char* key) const {
     if (!value_->is_object()) Fail("expected an object");
-    const Value* member = value_->Find(key);
-    if (!member) return nullptr;
-    const auto index = static_cast<std::size_t>(member - value_->Items().data());
+    // Members are mostly read in the order they were written: try the one after the last
+    // read first. (Of a name given twice this may find the first; Done() refuses both.)
+    const auto members = value_->Items();
+    const std::string_view name(key);
+    const Value* member = nullptr;
+    if (next_ < members.size() && members[next_].Key() == name) {
+        member = &members[next_];
+    } else {
+        member = value_->Find(name);
+        if (!member) return nullptr;
+    }
+    const auto index = static_cast<std::size_t>(member - members.data());
+    next_ = index + 1;
     if (index < 64) {
         read_ |= std::uint64_t{1} << index;
     } else {
@@ -370,6 +383,22 @@ private:
     std::string_view ParseString() {
         ++p_;  // the opening quote
         const char* start = p_;
+#if defined(__SSE2__)
+        // Plain bytes 16 at a time, up to the first quote, backslash, control character or
+        // byte of a multi-byte sequence (signed, those are below 0x20 too).
+        while (end_ - p_ >= 16) {
+            const __m128i v = _mm_loadu_si128(reinterpret_cast<const __m128i*>(p_));
+            const __m128i stops = _mm_or_si128(
+                _mm_or_si128(_mm_cmpeq_epi8(v, _mm_set1_epi8('"')), _mm_cmpeq_epi8(v, _mm_set1_epi8('\\'))),
+                _mm_cmplt_epi8(v, _mm_set1_epi8(0x20)));
+            const auto mask = static_cast<unsigned>(_mm_movemask_epi8(stops));
+            if (mask != 0) {
+                p_ += std::countr_zero(mask);
+                break;
+            }
+            p_ += 16;
+        }
+#endif
         while (p_ != end_) {
             const auto c = static_cast<unsigned char>(*p_);
             if (c == '"') {
@@ -499,6 +528,21 @@ private:
         }
         if (p_ != end_ && *p_ >= '0' && *p_ <= '9') Fail("a number has a leading zero");
         if (integral) {
+            // Up to 18 digits cannot overflow: the value is taken as the digits go by.
+            const char* digitsStart = negative ? start + 1 : start;
+            if (p_ - digitsStart <= 18) {
+                std::uint64_t v = 0;
+                for (const char* d = digitsStart; d != p_; ++d)
+                    v = v * 10 + static_cast<std::uint64_t>(*d - '0');
+                if (negative) {
+                    value.kind_ = Value::Kind::kInt;
+                    value.u_.integer = -static_cast<std::int64_t>(v);
+                } else {
+                    value.kind_ = Value::Kind::kUnsigned;
+                    value.u_.unsigned_ = v;
+                }
+                return;
+            }
             if (negative) {
                 std::int64_t v = 0;
                 auto [at, error] = std::from_chars(start, p_, v);

@@ -180,6 +180,7 @@ private:
     // The members read: by position for the first 64, counted beyond.
     mutable std::uint64_t read_ = 0;
     mutable std::size_t readBeyond_ = 0;
+    mutable std::size_t next_ = 0;  // where the next member read is looked for first
 };
 
 // Parses text into a document; a syntax error becomes a SectionFault naming the section. The

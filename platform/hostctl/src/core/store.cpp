@@ -1,7 +1,12 @@
 #include "core/store.h"
 
-#include <array>
+#include <algorithm>
+#include <bit>
+#include <cstdint>
 #include <cstring>
+#if defined(__SSE2__)
+#include <emmintrin.h>
+#endif
 
 #include "core/text.h"
 #include "hostctl/exception.h"
@@ -32,13 +37,67 @@ SectionData& Access(Store& store, const SectionKind& kind, bool forWrite) {
 
 namespace {
 
-// The characters that matter when skipping a value: quotes and brackets.
-constexpr auto kStructural = [] {
-    std::array<bool, 256> table{};
-    for (unsigned char c : {'"', '{', '}', '[', ']'})
-        table[c] = true;
-    return table;
-}();
+// The bytes that matter when skipping a value, as masks over 16 bytes from p (bit i for
+// p[i]): quotes, backslashes and brackets. Brackets are found as '{' or '}' with the bit
+// that tells '[' from '{' (0x20) set: no other byte maps to those.
+struct Marks {
+    std::uint32_t quotes;
+    std::uint32_t backslashes;
+    std::uint32_t brackets;
+};
+
+Marks Marks16(const char* p) {
+#if defined(__SSE2__)
+    const __m128i v = _mm_loadu_si128(reinterpret_cast<const __m128i*>(p));
+    const __m128i folded = _mm_or_si128(v, _mm_set1_epi8(0x20));
+    const __m128i brackets =
+        _mm_or_si128(_mm_cmpeq_epi8(folded, _mm_set1_epi8('{')), _mm_cmpeq_epi8(folded, _mm_set1_epi8('}')));
+    return {static_cast<std::uint32_t>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_set1_epi8('"')))),
+            static_cast<std::uint32_t>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_set1_epi8('\\')))),
+            static_cast<std::uint32_t>(_mm_movemask_epi8(brackets))};
+#else
+    Marks marks{0, 0, 0};
+    for (int i = 0; i < 16; ++i) {
+        const char c = p[i];
+        const char folded = static_cast<char>(c | 0x20);
+        const std::uint32_t bit = std::uint32_t{1} << i;
+        if (c == '"') marks.quotes |= bit;
+        if (c == '\\') marks.backslashes |= bit;
+        if (folded == '{' || folded == '}') marks.brackets |= bit;
+    }
+    return marks;
+#endif
+}
+
+// The same over 64 bytes.
+struct Marks64 {
+    std::uint64_t quotes = 0;
+    std::uint64_t backslashes = 0;
+    std::uint64_t brackets = 0;
+};
+
+Marks64 MarksOf64(const char* p) {
+    Marks64 marks;
+    for (int i = 0; i < 4; ++i) {
+        const Marks part = Marks16(p + 16 * i);
+        marks.quotes |= std::uint64_t{part.quotes} << (16 * i);
+        marks.backslashes |= std::uint64_t{part.backslashes} << (16 * i);
+        marks.brackets |= std::uint64_t{part.brackets} << (16 * i);
+    }
+    return marks;
+}
+
+// Bit i set when an odd number of bits at i and below are set in mask: with the quotes of a
+// block, the bytes inside strings (the opening quote included).
+std::uint64_t PrefixXor(std::uint64_t mask) {
+    mask ^= mask << 1;
+    mask ^= mask << 2;
+    mask ^= mask << 4;
+    mask ^= mask << 8;
+    mask ^= mask << 16;
+    mask ^= mask << 32;
+    return mask;
+}
 
 // A forward-only reader of the document's top level. It knows enough JSON to find where
 // each value ends (strings with escapes, nested brackets) without building anything.
@@ -77,40 +136,87 @@ public:
         }
         return false;
     }
+    // Skips an object or array at pos. The text goes by 64 bytes at a time: where a block has
+    // no backslash, the quotes tell at once which bytes lie inside strings and only the
+    // brackets outside them are visited; else every byte that matters is, in order.
+    std::string SkipContainer() {
+        std::vector<char> closers;
+        const char* data = text_.data();
+        const std::size_t size = text_.size();
+        bool inString = false;
+        bool escaped = false;  // a backslash ended the last block: the next byte is escaped
+        char tail[64];
+        // A bracket outside strings; true when it closed the container (pos is then past it),
+        // or when it does not match (fault set).
+        auto bracket = [&](char c, std::size_t at, std::string& fault) {
+            if (c == '{' || c == '[') {
+                closers.push_back(c == '{' ? '}' : ']');
+                return false;
+            }
+            pos = at + 1;
+            if (closers.empty() || closers.back() != c) {
+                fault = "mismatched '" + std::string(1, c) + "' at byte " + std::to_string(at);
+                return true;
+            }
+            closers.pop_back();
+            return closers.empty();
+        };
+        std::string fault;
+        for (std::size_t base = pos; base < size; base += 64) {
+            const std::size_t width = std::min<std::size_t>(64, size - base);
+            const char* block = data + base;
+            if (width < 64) {
+                std::memset(tail, ' ', sizeof(tail));
+                std::memcpy(tail, block, width);
+                block = tail;
+            }
+            const Marks64 marks = MarksOf64(block);
+            if (marks.backslashes == 0 && !escaped) {
+                std::uint64_t inside = PrefixXor(marks.quotes);
+                if (inString) inside = ~inside;
+                inString = (inside >> 63) != 0;
+                for (std::uint64_t outer = marks.brackets & ~inside; outer != 0; outer &= outer - 1) {
+                    const auto bit = static_cast<std::size_t>(std::countr_zero(outer));
+                    if (bracket(block[bit], base + bit, fault)) return fault;
+                }
+                continue;
+            }
+            std::uint64_t mask = marks.quotes | marks.backslashes | marks.brackets;
+            if (escaped) {
+                mask &= ~std::uint64_t{1};
+                escaped = false;
+            }
+            while (mask != 0) {
+                const auto bit = static_cast<std::size_t>(std::countr_zero(mask));
+                mask &= mask - 1;
+                const char c = block[bit];
+                if (inString) {
+                    if (c == '"') {
+                        inString = false;
+                    } else if (c == '\\') {
+                        if (bit + 1 < 64) {
+                            mask &= ~(std::uint64_t{1} << (bit + 1));
+                        } else {
+                            escaped = true;
+                        }
+                    }
+                } else if (c == '"') {
+                    inString = true;
+                } else if (c != '\\') {  // a backslash outside strings: left for the parser
+                    if (bracket(c, base + bit, fault)) return fault;
+                }
+            }
+        }
+        pos = size;
+        return "truncated";
+    }
+
     // Skips one value; returns an empty string on success, else the fault.
     std::string SkipValue() {
         if (AtEnd()) return "truncated";
         char c = Peek();
         if (c == '"') return SkipString() ? std::string() : "truncated";
-        if (c == '{' || c == '[') {
-            std::vector<char> closers;
-            const char* data = text_.data();
-            const std::size_t size = text_.size();
-            while (pos < size) {
-                c = data[pos];
-                if (!kStructural[static_cast<unsigned char>(c)]) {
-                    ++pos;
-                    continue;
-                }
-                if (c == '"') {
-                    if (!SkipString()) return "truncated";
-                    continue;
-                }
-                ++pos;
-                if (c == '{') {
-                    closers.push_back('}');
-                } else if (c == '[') {
-                    closers.push_back(']');
-                } else if (c == '}' || c == ']') {
-                    if (closers.empty() || closers.back() != c) {
-                        return "mismatched '" + std::string(1, c) + "' at byte " + std::to_string(pos - 1);
-                    }
-                    closers.pop_back();
-                    if (closers.empty()) return {};
-                }
-            }
-            return "truncated";
-        }
+        if (c == '{' || c == '[') return SkipContainer();
         std::size_t start = pos;
         while (pos < text_.size() && std::strchr(",}] \t\r\n", text_[pos]) == nullptr)
             ++pos;

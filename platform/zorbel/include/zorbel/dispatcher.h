@@ -97,9 +97,16 @@ public:
     // The exit status an output stands for (0, or 1 with errors or a false boolean root).
     static int StatusOf(const CallSpec::Output& output);
 
+    // A program that ends right after its command need not take the result apart value by
+    // value (a long listing holds tens of thousands): with keep set, Execute holds on to its
+    // last result until the next Execute or the dispatcher's end.
+    void KeepLastResult(bool keep) { keepLast_ = keep; }
+
 private:
     std::string programName_;
     std::shared_ptr<NamespaceNode> root_;
+    bool keepLast_ = false;
+    std::shared_ptr<CallSpec::Output> last_;
 };
 
 }  // namespace Zorbel::AutoCli

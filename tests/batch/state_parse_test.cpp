@@ -32,6 +32,27 @@ TEST(StateParse, StringsDecodeEscapesAndKeepUtf8) {
     EXPECT_EQ(v.Items()[3].String(), "");
 }
 
+TEST(StateParse, LongStringsDecodeWhereverTheirEscapesFall) {
+    // Plain runs are taken 16 bytes at a time: an escape, a multi-byte character or the end
+    // may fall anywhere in them.
+    for (std::size_t pad = 0; pad < 40; ++pad) {
+        const std::string plain(pad, 'x');
+        const std::string text = "[\"" + plain + "\", \"" + plain + "\\n" + plain + "\", \"" + plain +
+                                 "\xc3\xa9" + plain + "\", \"" + plain + "\\u0041\"]";
+        const auto document = Parse(text, "s");
+        const auto items = document.Root().Items();
+        ASSERT_EQ(items.size(), 4u);
+        EXPECT_EQ(items[0].String(), plain);
+        EXPECT_EQ(items[1].String(), plain + "\n" + plain);
+        EXPECT_EQ(items[2].String(), plain + "\xc3\xa9" + plain);
+        EXPECT_EQ(items[3].String(), plain + "A");
+        EXPECT_NE(Refusal("[\"" + plain + "\x01" + plain + "\"]").find("control character in a string"),
+                  std::string::npos);
+        EXPECT_NE(Refusal("[\"" + plain + "\xff" + plain + "\"]").find("not valid UTF-8"), std::string::npos);
+        EXPECT_NE(Refusal("[\"" + plain).find("not closed"), std::string::npos);
+    }
+}
+
 TEST(StateParse, RefusesWhatIsNotStrictJson) {
     for (const char* bad : {"",
                             "[1,]",
@@ -83,6 +104,18 @@ TEST(StateParse, NumbersKeepTheirKind) {
     for (int i : {3, 4, 5})
         EXPECT_FALSE(n[static_cast<std::size_t>(i)].is_number_integer()) << i;
     EXPECT_DOUBLE_EQ(n[5].Double(), 2000);
+    // Around the length where digits are taken as they go by.
+    const auto edges = Parse(
+        "[999999999999999999, 1000000000000000000, -999999999999999999, -1000000000000000000, "
+        "9223372036854775807, -9223372036854775809]",
+        "s");
+    const auto e = edges.Root().Items();
+    EXPECT_EQ(e[0].Unsigned(), 999999999999999999ull);
+    EXPECT_EQ(e[1].Unsigned(), 1000000000000000000ull);
+    EXPECT_EQ(e[2].Integer(), -999999999999999999ll);
+    EXPECT_EQ(e[3].Integer(), -1000000000000000000ll);
+    EXPECT_EQ(e[4].Unsigned(), 9223372036854775807ull);
+    EXPECT_FALSE(e[5].is_number_integer());
     // Read as integers of a given width.
     const auto doc =
         Parse(R"({"small": 7, "negative": -1, "float": 2e3, "huge": 18446744073709551616})", "s");
@@ -101,6 +134,24 @@ TEST(StateParse, NumbersKeepTheirKind) {
               "s.negative: expected an integer from 0 to 4294967295");
     EXPECT_EQ(refused([&] { in.Int<std::uint32_t>("float"); }), "s.float: expected an integer");
     EXPECT_EQ(refused([&] { in.Int<std::uint64_t>("huge"); }), "s.huge: expected an integer");
+}
+
+TEST(StateParse, MembersMayBeReadInAnyOrder) {
+    const auto doc = Parse(R"({"a": 1, "b": "two", "c": true, "d": 4})", "s");
+    In in(doc.Root(), "s");
+    EXPECT_EQ(in.Int<int>("d"), 4);
+    EXPECT_EQ(in.Str("b"), "two");
+    EXPECT_EQ(in.Int<int>("a"), 1);
+    EXPECT_EQ(in.Int<int>("a"), 1);  // read again: still one member
+    EXPECT_FALSE(in.Has("e"));
+    try {
+        in.Done();
+        FAIL() << "a member never read was accepted";
+    } catch (const TknCtl::Lib::SectionFault& e) {
+        EXPECT_STREQ(e.what(), "s: unknown member 'c'");
+    }
+    EXPECT_TRUE(in.Bool("c"));
+    EXPECT_NO_THROW(in.Done());
 }
 
 TEST(StateParse, MembersAreReadOnceAndNeverTwice) {

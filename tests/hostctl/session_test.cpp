@@ -117,6 +117,28 @@ TEST(Document, ScanRefusesDamagedText) {
     }
 }
 
+TEST(Document, ScanFindsSectionEndsWhereverTheTextFalls) {
+    // The scan goes through the text in blocks: quotes, escapes and brackets inside strings
+    // must be told apart wherever they fall, at the edge of a block or inside one.
+    const std::string tricky = R"([{"a":"q\"]}[{\\","b":"\\","c":["}{][",{"d":"\\\""}]}])";
+    for (std::size_t pad = 0; pad < 140; ++pad) {
+        const std::string text = "{\"version\":1,\"pnics\":[{\"p\":\"" + std::string(pad, 'x') + "\"}," +
+                                 tricky.substr(1) + ",\"ipsettings\":{\"ipv6Enabled\":true}}";
+        ASSERT_EQ(Refusal(text), "") << pad;
+        {
+            auto session = HostSession::InMemory(text);
+            EXPECT_TRUE(Read<Model::IpSettingsSection>().ipv6Enabled) << pad;
+        }
+        // An escaped quote that leaves the string open leaves the document unfinished.
+        const std::string open = "{\"version\":1,\"pnics\":[\"" + std::string(pad, 'x') + "\\\"]}";
+        EXPECT_NE(Refusal(open).find("truncated document"), std::string::npos) << pad;
+        const std::string crossed = "{\"version\":1,\"pnics\":[" + std::string(pad, ' ') + "}]}";
+        EXPECT_NE(Refusal(crossed).find("mismatched '}' at byte " + std::to_string(22 + pad)),
+                  std::string::npos)
+            << Refusal(crossed);
+    }
+}
+
 TEST(Document, SectionsAreParsedWhenTouchedAndCheckedStrictly) {
     // A broken section does not stop a session that never touches it...
     auto session =

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <charconv>
 #include <cstdlib>
 #include <iterator>
 #include <string>
@@ -148,6 +149,16 @@ void AppendJson(std::string& out, const MetaObject* value) {
     }
 }
 
+std::size_t DisplayWidth(std::string_view text);
+
+// Text of printable ASCII only, which a terminal shows as it is.
+bool PlainAscii(std::string_view text) {
+    for (unsigned char c : text) {
+        if (c < 0x20 || c >= 0x7f) return false;
+    }
+    return true;
+}
+
 // ---------------------------------------------------------------- shared by simple and table
 
 // Display rules of one rendering: which fields of a record, its heading, the units.
@@ -244,6 +255,37 @@ public:
             text += *unit;
         }
         return text;
+    }
+    // The same, appended to out; returns its display width. Strings and numbers, most of a
+    // long table, are written straight in.
+    std::size_t AppendCell(std::string& out, const MetaObject* value,
+                           const std::optional<std::string>& unit) const {
+        const std::size_t start = out.size();
+        bool plain = false;
+        if (value->GetType() == MetaObj::META_STRING) {
+            const std::string& text = static_cast<const MetaString*>(value)->Get();
+            plain = PlainAscii(text);
+            if (plain || raw_) {
+                out += text;
+            } else {
+                out += Display(text);
+            }
+        } else if (value->GetType() == MetaObj::META_INT) {
+            char digits[24];
+            const auto end =
+                std::to_chars(digits, digits + sizeof(digits), static_cast<const MetaInt*>(value)->Get());
+            out.append(digits, end.ptr);
+            plain = true;
+        } else {
+            out += Plain(value);
+        }
+        if (unit) {
+            out += ' ';
+            out += *unit;
+            plain = plain && PlainAscii(*unit);
+        }
+        const std::string_view cell = std::string_view(out).substr(start);
+        return plain ? cell.size() : DisplayWidth(cell);
     }
 
     std::string Plain(const MetaObject* value) const {
@@ -475,10 +517,8 @@ private:
                         }
                     }
                 }
-                const std::size_t start = cellText.size();
-                if (value) cellText += layout_.Cell(value, units[i]);
+                cellWidths.push_back(value ? layout_.AppendCell(cellText, value, units[i]) : 0);
                 cellEnds.push_back(cellText.size());
-                cellWidths.push_back(DisplayWidth(std::string_view(cellText).substr(start)));
                 widths[i] = std::max(widths[i], cellWidths.back());
             }
         }

@@ -327,7 +327,10 @@ void Store::Scan() {
 SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
     Slot* slot = nullptr;
     for (auto& candidate : slots_) {
-        if (candidate.kind == &kind) slot = &candidate;
+        if (candidate.kind == &kind) {
+            slot = &candidate;
+            break;
+        }
     }
     if (!slot) throw HostCtl::Lib::HostCtlException(std::string("unknown section kind ") + kind.Name());
     if (!slot->data) {

@@ -112,17 +112,23 @@ OutputSpecPtr ListOutput(RecordPtr prototype) {
 namespace {
 
 // The empty scalar values: one of each, shared by every field that starts with it. A scalar
-// field is only ever replaced by SetField, never changed in place.
+// field is only ever replaced by SetField, never changed in place. They live as long as the
+// process, and their handles own nothing: copying one costs no reference counting.
+template <typename Value>
+std::shared_ptr<MetaObj::MetaObject> Shared() {
+    static const Value* const value = new Value();
+    return std::shared_ptr<MetaObj::MetaObject>(std::shared_ptr<void>(), const_cast<Value*>(value));
+}
 const std::shared_ptr<MetaObj::MetaObject>& EmptyString() {
-    static const std::shared_ptr<MetaObj::MetaObject> empty = MetaObj::MetaString::New();
+    static const auto empty = Shared<MetaObj::MetaString>();
     return empty;
 }
 const std::shared_ptr<MetaObj::MetaObject>& EmptyInt() {
-    static const std::shared_ptr<MetaObj::MetaObject> empty = MetaObj::MetaInt::New();
+    static const auto empty = Shared<MetaObj::MetaInt>();
     return empty;
 }
 const std::shared_ptr<MetaObj::MetaObject>& EmptyBool() {
-    static const std::shared_ptr<MetaObj::MetaObject> empty = MetaObj::MetaBool::New();
+    static const auto empty = Shared<MetaObj::MetaBool>();
     return empty;
 }
 
@@ -167,11 +173,13 @@ RecordPtr MakeRecord(const std::string& recordName, const std::vector<Field>& fi
 }
 
 RecordPtr RecordMaker::New() const {
-    auto record = MetaObj::MetaStruct::New(prototype_->GetName());
-    const auto& fields = prototype_->GetFields();
-    record->Reserve(fields.size());
-    for (const auto& [name, empty] : fields)
-        record->SetField(name, EmptyOfItsOwn(empty));
+    // A copy of the prototype, its records and lists then made its own.
+    auto record = std::make_shared<MetaObj::MetaStruct>(*prototype_);
+    for (const auto& [name, empty] : prototype_->GetFields()) {
+        const auto type = empty->GetType();
+        if (type == MetaObj::META_STRUCT || type == MetaObj::META_LIST)
+            record->SetField(name, empty->Clone());
+    }
     return record;
 }
 

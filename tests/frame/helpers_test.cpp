@@ -103,6 +103,42 @@ TEST(FrameHelpers, RecordsAreFreshEachTime) {
     EXPECT_EQ(root->GetPrototype(), a);
 }
 
+TEST(FrameHelpers, RecordMakerGivesWhatMakeRecordGives) {
+    using Zorbel::MetaObj::MetaList;
+    using Zorbel::MetaObj::MetaStruct;
+    auto command = SampleThingSet::New();
+    const RecordMaker rows(command->GetOutputStructure());
+    auto a = rows.New();
+    auto b = rows.New();
+    auto made = command->GetOutputStructure();
+    ASSERT_EQ(a->GetFields().size(), made->GetFields().size());
+    for (std::size_t i = 0; i < made->GetFields().size(); ++i) {
+        EXPECT_EQ(a->GetFields()[i].first, made->GetFields()[i].first);
+        EXPECT_EQ(a->GetFields()[i].second->GetType(), made->GetFields()[i].second->GetType());
+    }
+    EXPECT_EQ(a->GetName(), "Thing");
+    // Records and lists are each record's own; scalars are replaced, never shared changes.
+    std::static_pointer_cast<MetaList>(a->GetField("Tags"))->Add("x");
+    std::static_pointer_cast<MetaStruct>(a->GetField("Link"))->SetField("Speed", 10);
+    a->SetField("Name", "first");
+    a->SetField("MTU", 1500);
+    EXPECT_EQ(std::static_pointer_cast<MetaList>(b->GetField("Tags"))->GetItems().size(), 0u);
+    EXPECT_EQ(std::static_pointer_cast<Zorbel::MetaObj::MetaInt>(
+                  std::static_pointer_cast<MetaStruct>(b->GetField("Link"))->GetField("Speed"))
+                  ->Get(),
+              0);
+    EXPECT_EQ(std::static_pointer_cast<Zorbel::MetaObj::MetaString>(b->GetField("Name"))->Get(), "");
+    EXPECT_EQ(std::static_pointer_cast<Zorbel::MetaObj::MetaInt>(b->GetField("MTU"))->Get(), 0);
+    EXPECT_EQ(std::static_pointer_cast<Zorbel::MetaObj::MetaString>(a->GetField("Name"))->Get(), "first");
+    // Setting fields out of their order, or a new one, keeps one field per name.
+    a->SetField("Up", true);
+    a->SetField("Name", "again");
+    a->SetField("Extra", "e");
+    EXPECT_EQ(a->GetFields().size(), 6u);
+    EXPECT_EQ(a->GetFields().back().first, "Extra");
+    EXPECT_EQ(std::static_pointer_cast<Zorbel::MetaObj::MetaString>(a->GetField("Name"))->Get(), "again");
+}
+
 TEST(FrameHelpers, HostControlFailuresBecomeOneMessage) {
     auto command = SampleThingSet::New();
     auto output = Zorbel::CallSpec::Output::New();

@@ -61,13 +61,21 @@ inline bool SameName(const std::string& a, const std::string& b) {
 }  // namespace
 
 void MetaStruct::SetField(const std::string& field, std::shared_ptr<MetaObject> value) {
-    for (auto& entry : fields_) {
-        if (SameName(entry.first, field)) {
-            entry.second = std::move(value);
+    // Fields are mostly set in the order a record was laid out: the one after the field set
+    // last is tried first.
+    if (next_ < fields_.size() && SameName(fields_[next_].first, field)) {
+        fields_[next_++].second = std::move(value);
+        return;
+    }
+    for (std::size_t i = 0; i < fields_.size(); ++i) {
+        if (SameName(fields_[i].first, field)) {
+            fields_[i].second = std::move(value);
+            next_ = i + 1;
             return;
         }
     }
     fields_.emplace_back(field, std::move(value));
+    next_ = fields_.size();
 }
 
 void MetaStruct::SetField(const std::string& field, std::shared_ptr<MetaString> value) {

@@ -52,6 +52,9 @@ public:
     explicit SectionKind(const char* name) : name_(name) {}
     virtual ~SectionKind();
     const char* Name() const { return name_; }
+    // Where the kind stands in AllSections() (set there), for finding its slot at once.
+    std::size_t Position() const { return position_; }
+    void SetPosition(std::size_t position) const { position_ = position; }
 
     // Parses the section's JSON text; throws SectionFault.
     virtual std::unique_ptr<SectionData> Parse(std::string_view text) const = 0;
@@ -65,6 +68,7 @@ public:
 
 private:
     const char* name_;
+    mutable std::size_t position_ = static_cast<std::size_t>(-1);
 };
 
 // Every kind of section, in document order.

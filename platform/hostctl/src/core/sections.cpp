@@ -33,6 +33,12 @@ const std::vector<const SectionKind*>& AllSections() {
         &Model::PortsSection::Kind(),      &Model::WorldsSection::Kind(),
         &Model::FaultsSection::Kind(),     &Model::JournalSection::Kind(),
     };
+    static const bool placed = [] {
+        for (std::size_t i = 0; i < kinds.size(); ++i)
+            kinds[i]->SetPosition(i);
+        return true;
+    }();
+    static_cast<void>(placed);
     return kinds;
 }
 

@@ -326,10 +326,14 @@ void Store::Scan() {
 
 SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
     Slot* slot = nullptr;
-    for (auto& candidate : slots_) {
-        if (candidate.kind == &kind) {
-            slot = &candidate;
-            break;
+    if (kind.Position() < slots_.size() && slots_[kind.Position()].kind == &kind) {
+        slot = &slots_[kind.Position()];
+    } else {
+        for (auto& candidate : slots_) {
+            if (candidate.kind == &kind) {
+                slot = &candidate;
+                break;
+            }
         }
     }
     if (!slot) throw HostCtl::Lib::HostCtlException(std::string("unknown section kind ") + kind.Name());

@@ -122,6 +122,7 @@ private:
 
     std::string name_;
     std::vector<Field> fields_;
+    std::size_t next_ = 0;  // where SetField looks first
 };
 
 // A list of strings (element type 2) or of records (element type 3, with a prototype record

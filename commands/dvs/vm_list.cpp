@@ -39,6 +39,7 @@ RecordPtr VMList::GetOutputStructure() {
 void VMList::ExecuteInternal(InputPtr, OutputPtr output) {
     Frame::HostCall(output, "Unable to list VM's: ", [&] {
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         std::unordered_map<std::uint32_t, std::vector<std::string>> networks;
 
         TknCtl::Network::VirtualSwitchInfoImpl info;
@@ -65,7 +66,7 @@ void VMList::ExecuteInternal(InputPtr, OutputPtr output) {
         }
 
         for (const auto& [worldId, names] : networks) {
-            auto record = GetOutputStructure();
+            auto record = rows.New();
             record->SetField("World ID", worldId);
             record->SetField("Name", VmName(TknCtl::Resource::WorldImpl(worldId).GetWorldName()));
             record->SetField("Num Ports", names.size());

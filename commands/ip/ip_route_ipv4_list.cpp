@@ -34,8 +34,9 @@ void IpRouteIpv4List::ExecuteInternal(InputPtr input, OutputPtr output) {
         const std::string& netstack = input->GetParameter("netstack");
         if (!netstack.empty()) routing.SetNetstackInstanceKey(netstack);
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         for (const auto& route : routing.GetCurrentTarkonRoutes()) {
-            auto record = GetOutputStructure();
+            auto record = rows.New();
             record->SetField("Netmask", route.network.GetNetmask().GetStringAddress());
             record->SetField("Interface", route.interfaceName);
             record->SetField("Network", route.network == RoutingInfoImpl::DEFAULT_IPV4_ROUTE

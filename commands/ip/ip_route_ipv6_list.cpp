@@ -33,8 +33,9 @@ void IpRouteIpv6List::ExecuteInternal(InputPtr input, OutputPtr output) {
         const std::string& netstack = input->GetParameter("netstack");
         if (!netstack.empty()) routing.SetNetstackInstanceKey(netstack);
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         for (const auto& route : routing.GetCurrentIpv6TarkonRoutes()) {
-            auto record = GetOutputStructure();
+            auto record = rows.New();
             record->SetField("Netmask",
                              HostCtl::Network::Ipv6Network::NetmaskFromNumber(route.network.GetNetmask())
                                  .GetStringAddress());

@@ -33,11 +33,12 @@ void MulticastGroupList::ExecuteInternal(InputPtr, OutputPtr output) {
             nicInfo = networkInfo->GetTarkonNicInfo();
         }
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         for (const auto& nic : nicInfo->GetTarkonNics()) {
             std::vector<HostCtl::Network::TknNic::MulticastGroup> groups;
             nic->GetMulticastGroups(groups);
             for (const auto& group : groups) {
-                auto record = GetOutputStructure();
+                auto record = rows.New();
                 record->SetField("Interface", group.interfaceName);
                 record->SetField("Refcount", group.refCount);
                 record->SetField("Group", group.groupAddress);

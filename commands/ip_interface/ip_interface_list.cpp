@@ -56,12 +56,13 @@ void SetOpaqueNotApplicable(const RecordPtr& record) {
 
 void IpInterfaceList::ExecuteInternal(InputPtr input, OutputPtr output) {
     auto list = Frame::MakeList(GetOutputStructure());
+    const Frame::RecordMaker rows(GetOutputStructure());
     Frame::HostCall(output, [&] {
         TknCtl::Network::TarkonNicInfoImpl info;
         const std::string& netstack = input->GetParameter("netstack");
         auto nics = netstack.empty() ? info.GetTarkonNics() : info.GetTarkonNicsByInstanceKey(netstack);
         for (const auto& nic : nics) {
-            auto record = GetOutputStructure();
+            auto record = rows.New();
             record->SetField("Name", nic->GetName());
             record->SetField("MAC Address", nic->GetMacAddress().GetStringAddress());
 

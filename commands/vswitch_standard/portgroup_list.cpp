@@ -26,9 +26,10 @@ RecordPtr VirtualSwitchPortGroupList::GetOutputStructure() {
 void VirtualSwitchPortGroupList::ExecuteInternal(InputPtr, OutputPtr output) {
     Frame::HostCall(output, [&] {
         auto list = Frame::MakeList(GetOutputStructure());
+        const Frame::RecordMaker rows(GetOutputStructure());
         TknCtl::Network::NetworkInfoImpl info;
         for (const auto& group : info.GetAllPortGroups()) {
-            auto record = GetOutputStructure();
+            auto record = rows.New();
             record->SetField("Name", group->GetName());
             record->SetField("Virtual Switch", group->GetVirtualSwitchName());
             record->SetField("Active Clients", static_cast<long>(group->GetActiveClients()));

@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Whole-process benchmarks of hadrocli, measured in one run on this machine:
-#   - read and change commands on the default host against /bin/true and `ip -j addr show`;
+#   - read and change commands on the default host against /bin/true and `ip -j addr show`,
+#     and against programs built like hadrocli that only start (bench/start_*.cpp);
 #   - every list command (and a change) on the scale-1 host, against the 25 ms target;
 #   - how many times a change on the scale-1 host writes the state file;
 #   - the growth of cost from scale 0.25 to 4;
@@ -75,6 +76,10 @@ for scale in 0.25 0.5 1 2 4; do HADRO_STATE=$hosts/scale-$scale.json "$sim" gene
 default=$hosts/default.json
 measure "ref /bin/true" "$(runs 300)" "" /bin/true
 if command -v ip >/dev/null; then measure "ref ip -j addr show" "$(runs 300)" "" ip -j addr show; fi
+# What any program built like hadrocli pays to start, and with its two libraries loaded.
+[ -x "$build/bin/start_floor" ] && measure "ref a C++ program that only starts" "$(runs 300)" "" "$build/bin/start_floor"
+[ -x "$build/bin/start_libs" ] && measure "ref ... with the framework and host-control libraries" "$(runs 300)" "" \
+    "$build/bin/start_libs"
 for line in "network ip interface list" "network nic list" "network ip dns server list" "network vswitch standard list" \
     "--list-commands"; do
     read -ra words <<<"$line"

@@ -5,6 +5,8 @@
 #include <string>
 
 #include "core/json_io.h"
+#include "generate.h"
+#include "hostctl/session.h"
 
 namespace {
 
@@ -168,6 +170,33 @@ TEST(StateParse, MembersAreReadOnceAndNeverTwice) {
     } catch (const TknCtl::Lib::SectionFault& e) {
         EXPECT_STREQ(e.what(), "s: member 'name' appears twice");
     }
+}
+
+TEST(StateWrite, DumpWritesWhatTheLibraryWould) {
+    using TknCtl::Json::Dump;
+    using TknCtl::Json::Node;
+    auto library = [](const Node& node) { return node.dump(-1, ' ', false, Node::error_handler_t::replace); };
+    // Every section of the default host and of a generated one, as the state holds them.
+    for (const std::string& text :
+         {HostCtl::Lib::HostSession::InMemoryDefault()->Export(), Hadro::Sim::GenerateHost(0.05)}) {
+        const Node document = Node::parse(text);
+        for (const auto& [name, section] : document.items())
+            EXPECT_EQ(Dump(section), library(section)) << name;
+        EXPECT_EQ(Dump(document), library(document));
+    }
+    // Text that must be escaped, text that is not UTF-8, numbers of every kind, empty and
+    // nested containers.
+    Node odd = Node::object();
+    odd["escapes"] = std::string("q\"b\\s/\b\f\n\r\t\x01\x1f\x7f end");
+    odd["utf8"] = "\xc3\xa9\xe2\x82\xac\xf0\x9f\x98\x80";
+    odd["broken"] = std::string(
+        "a\xff\xc3(b\xed\xa0\x80"
+        "c\xf4\x90\x80\x80");
+    odd["broken \xfe key"] = 1;
+    odd["numbers"] = Node::array({0, -1, INT64_MIN, UINT64_MAX, 1.5, -0.25, 1e300, 2.0});
+    odd["empty"] = Node::array({Node::object(), Node::array(), "", nullptr, true, false});
+    odd["nested"] = Node::object({{"a", Node::array({Node::object({{"b", Node::array()}})})}});
+    EXPECT_EQ(Dump(odd), library(odd));
 }
 
 }  // namespace

@@ -586,8 +586,145 @@ Document Parse(std::string_view text, const char* sectionName) {
     return document;
 }
 
+namespace {
+
+// Whether text is well-formed UTF-8 (no overlong forms, no surrogates, nothing beyond
+// U+10FFFF).
+bool WellFormedUtf8(std::string_view text) {
+    const auto* s = reinterpret_cast<const unsigned char*>(text.data());
+    const std::size_t n = text.size();
+    std::size_t i = 0;
+    auto tail = [&](std::size_t at) { return at < n && (s[at] & 0xc0) == 0x80; };
+    while (i < n) {
+        const unsigned char c = s[i];
+        if (c < 0x80) {
+            ++i;
+        } else if (c >= 0xc2 && c <= 0xdf) {
+            if (!tail(i + 1)) return false;
+            i += 2;
+        } else if (c >= 0xe0 && c <= 0xef) {
+            if (!tail(i + 1) || !tail(i + 2)) return false;
+            if ((c == 0xe0 && s[i + 1] < 0xa0) || (c == 0xed && s[i + 1] >= 0xa0)) return false;
+            i += 3;
+        } else if (c >= 0xf0 && c <= 0xf4) {
+            if (!tail(i + 1) || !tail(i + 2) || !tail(i + 3)) return false;
+            if ((c == 0xf0 && s[i + 1] < 0x90) || (c == 0xf4 && s[i + 1] >= 0x90)) return false;
+            i += 4;
+        } else {
+            return false;
+        }
+    }
+    return true;
+}
+
+// A string as the library's compact dump writes it (no ASCII-only escaping).
+void WriteString(std::string_view text, std::string& out) {
+    if (!WellFormedUtf8(text)) {
+        // The library's own repair, byte for byte.
+        out += Node(std::string(text)).dump(-1, ' ', false, Node::error_handler_t::replace);
+        return;
+    }
+    static const char hex[] = "0123456789abcdef";
+    out += '"';
+    std::size_t plain = 0;
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        const auto c = static_cast<unsigned char>(text[i]);
+        if (c >= 0x20 && c != '"' && c != '\\') continue;
+        out.append(text, plain, i - plain);
+        plain = i + 1;
+        switch (c) {
+            case '"':
+                out += "\\\"";
+                break;
+            case '\\':
+                out += "\\\\";
+                break;
+            case '\b':
+                out += "\\b";
+                break;
+            case '\f':
+                out += "\\f";
+                break;
+            case '\n':
+                out += "\\n";
+                break;
+            case '\r':
+                out += "\\r";
+                break;
+            case '\t':
+                out += "\\t";
+                break;
+            default:
+                out += "\\u00";
+                out += hex[c >> 4];
+                out += hex[c & 0xf];
+        }
+    }
+    out.append(text, plain, std::string_view::npos);
+    out += '"';
+}
+
+template <typename Number>
+void WriteNumber(Number value, std::string& out) {
+    char digits[24];
+    const auto end = std::to_chars(digits, digits + sizeof(digits), value);
+    out.append(digits, end.ptr);
+}
+
+void Write(const Node& node, std::string& out) {
+    using Type = Node::value_t;
+    switch (node.type()) {
+        case Type::null:
+            out += "null";
+            return;
+        case Type::boolean:
+            out += node.get<bool>() ? "true" : "false";
+            return;
+        case Type::number_integer:
+            WriteNumber(node.get<std::int64_t>(), out);
+            return;
+        case Type::number_unsigned:
+            WriteNumber(node.get<std::uint64_t>(), out);
+            return;
+        case Type::string:
+            WriteString(node.get_ref<const std::string&>(), out);
+            return;
+        case Type::array: {
+            out += '[';
+            bool first = true;
+            for (const auto& item : node.get_ref<const Node::array_t&>()) {
+                if (!first) out += ',';
+                first = false;
+                Write(item, out);
+            }
+            out += ']';
+            return;
+        }
+        case Type::object: {
+            out += '{';
+            bool first = true;
+            for (const auto& [key, value] : node.get_ref<const Node::object_t&>()) {
+                if (!first) out += ',';
+                first = false;
+                WriteString(key, out);
+                out += ':';
+                Write(value, out);
+            }
+            out += '}';
+            return;
+        }
+        default:  // numbers with a fraction, and what the state never holds
+            out += node.dump(-1, ' ', false, Node::error_handler_t::replace);
+    }
+}
+
+}  // namespace
+
 std::string Dump(const Node& node) {
-    return node.dump(-1, ' ', false, Node::error_handler_t::replace);
+    // The same text as the library's compact dump, written straight into one string.
+    std::string out;
+    Write(node, out);
+    return out;
 }
 
 std::vector<std::uint8_t> HexBytes(const In& in) {

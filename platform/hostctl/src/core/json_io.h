@@ -189,6 +189,16 @@ Document Parse(std::string_view text, const char* sectionName);
 // Compact text of a node; strings that are not valid UTF-8 are repaired, never refused.
 std::string Dump(const Node& node);
 
+// Adds a member to an object without looking for one of the same name: for writers whose
+// keys are fixed and distinct, where a lookup per member would cost more than the rest.
+template <class V>
+void Append(Node& object, const char* key, V&& value) {
+    if (!object.is_object()) object = Node::object();
+    std::vector<std::pair<const std::string, Node>>& members = object.get_ref<Node::object_t&>();
+    members.emplace_back(std::piecewise_construct, std::forward_as_tuple(key),
+                         std::forward_as_tuple(std::forward<V>(value)));
+}
+
 // Hexadecimal text <-> bytes ("0a1b..."), for EEPROM and register images.
 std::vector<std::uint8_t> HexBytes(const In& in);
 std::string HexText(const std::vector<std::uint8_t>& bytes);

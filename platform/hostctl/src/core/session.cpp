@@ -326,8 +326,10 @@ void HostSession::Impl::WriteFile(const std::vector<std::string_view>& pieces) {
 }
 
 void HostSession::Commit() {
-    if (!impl_->mustWrite && !impl_->store->HasChanges()) return;
+    // Each changed section is serialized once: for telling whether it really changed, and
+    // then for writing.
     Store::Snapshot snapshot = impl_->store->TakeSnapshot();
+    if (!impl_->mustWrite && !impl_->store->Differs(snapshot)) return;
     if (!impl_->path.empty()) impl_->WriteFile(snapshot.pieces);
     impl_->mustWrite = false;
     impl_->store->Committed(std::move(snapshot));

@@ -388,6 +388,19 @@ bool Store::HasChanges() const {
     return false;
 }
 
+bool Store::Differs(const Snapshot& snapshot) const {
+    for (std::size_t i = 0; i < slots_.size(); ++i) {
+        if (!snapshot.serialized[i]) continue;
+        const auto& slot = slots_[i];
+        if (slot.present) {
+            if (Raw(slot) != *snapshot.serialized[i]) return true;
+        } else if (*snapshot.serialized[i] != slot.kind->Serialize(*slot.kind->Empty())) {
+            return true;
+        }
+    }
+    return false;
+}
+
 Store::Snapshot Store::TakeSnapshot() const {
     Snapshot snapshot;
     snapshot.serialized.resize(slots_.size());

@@ -56,6 +56,8 @@ public:
         std::vector<std::string_view> pieces;
     };
     Snapshot TakeSnapshot() const;
+    // Whether the sections a snapshot re-serialised differ from the text they were read from.
+    bool Differs(const Snapshot& snapshot) const;
     // After a snapshot was written: its re-serialised sections are the document's now.
     void Committed(Snapshot snapshot);
     // Drops every change since the text was read or last committed: sections are parsed

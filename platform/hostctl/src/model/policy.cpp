@@ -42,7 +42,7 @@ namespace {
 
 template <class T>
 void Put(Node& node, const char* key, const std::optional<T>& value) {
-    if (value) node[key] = *value;
+    if (value) Json::Append(node, key, *value);
 }
 
 template <class T>
@@ -113,7 +113,7 @@ Node SavePolicy(const Policy& p) {
     if (p.teaming.linkCriteria) {
         Node criteria = Node::object();
         Put(criteria, "beacon", p.teaming.linkCriteria->beacon);
-        teaming["linkCriteria"] = std::move(criteria);
+        Json::Append(teaming, "linkCriteria", std::move(criteria));
     }
     Put(teaming, "uplinkOrder", p.teaming.uplinkOrder);
     Put(teaming, "maxActive", p.teaming.maxActive);
@@ -126,8 +126,11 @@ Node SavePolicy(const Policy& p) {
     Put(shaping, "averageBps", p.shaping.averageBps);
     Put(shaping, "peakBps", p.shaping.peakBps);
     Put(shaping, "burstSize", p.shaping.burstSize);
-    return Node{
-        {"teaming", std::move(teaming)}, {"security", std::move(security)}, {"shaping", std::move(shaping)}};
+    Node out = Node::object();
+    Json::Append(out, "teaming", std::move(teaming));
+    Json::Append(out, "security", std::move(security));
+    Json::Append(out, "shaping", std::move(shaping));
+    return out;
 }
 
 }  // namespace TknCtl::Model

@@ -82,6 +82,29 @@ TEST(DefaultHost, EveryVmPortBelongsToANamedVmWorld) {
     EXPECT_GE(vmPorts, 4);
 }
 
+TEST(Consistency, EverySectionIsCheckedBeforeItIsUsed) {
+    // A switch with an uplink that is no NIC: the interfaces, whose checks only look the
+    // switches' port groups up, can be used; the switches themselves cannot.
+    const std::string dangling =
+        DefaultWith(R"("uplinks":["vmnic0","vmnic1"])", R"("uplinks":["vmnic0","vmnic9"])");
+    const std::string broken = DefaultWith(R"("uplinks":["vmnic0","vmnic1"])", R"("uplinks":["vmnic0",,])");
+    {
+        auto session = HostSession::InMemory(dangling);
+        EXPECT_FALSE(Read<Model::TknNicsSection>().nics.empty());
+        try {
+            Read<Model::VSwitchesSection>();
+            FAIL() << "a switch with an unknown uplink was used";
+        } catch (const StateFileError& e) {
+            EXPECT_NE(std::string(e.what()).find("uplink 'vmnic9' is not a physical NIC"), std::string::npos)
+                << e.what();
+        }
+        EXPECT_THROW(Read<Model::VSwitchesSection>(), StateFileError);  // again: nothing half-checked stays
+    }
+    // Text that is not JSON is refused even where it is only looked up.
+    auto session = HostSession::InMemory(broken);
+    EXPECT_THROW(Read<Model::TknNicsSection>(), StateFileError);
+}
+
 TEST(Consistency, DanglingReferencesBetweenSectionsAreRefused) {
     struct Case {
         std::string from, to, fault;

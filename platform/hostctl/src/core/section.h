@@ -80,6 +80,7 @@ const SectionKind* FindSection(std::string_view name);
 Store& CurrentStore();
 // The content of one section of a document, parsed and checked on first use.
 SectionData& Access(Store& store, const SectionKind& kind, bool forWrite);
+const SectionData& Parsed(Store& store, const SectionKind& kind);
 
 template <class T>
 const T& Read() {
@@ -99,9 +100,10 @@ class Checker {
 public:
     explicit Checker(Store& store) : store_(store) {}
 
+    // Another section, parsed: its own checks run when it is used itself.
     template <class T>
     const T& Get() {
-        return static_cast<const SectionValue<T>&>(Access(store_, T::Kind(), false)).value;
+        return static_cast<const SectionValue<T>&>(Parsed(store_, T::Kind())).value;
     }
     [[noreturn]] void Fail(const std::string& what) const;
 

@@ -35,6 +35,10 @@ SectionData& Access(Store& store, const SectionKind& kind, bool forWrite) {
     return store.Get(kind, forWrite);
 }
 
+const SectionData& Parsed(Store& store, const SectionKind& kind) {
+    return store.Parsed(kind);
+}
+
 namespace {
 
 // The bytes that matter when skipping a value, as masks over 16 bytes from p (bit i for
@@ -324,40 +328,52 @@ void Store::Scan() {
     if (!versionSeen) Refuse("the document has no \"version\"");
 }
 
-SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
-    Slot* slot = nullptr;
-    if (kind.Position() < slots_.size() && slots_[kind.Position()].kind == &kind) {
-        slot = &slots_[kind.Position()];
-    } else {
-        for (auto& candidate : slots_) {
-            if (candidate.kind == &kind) {
-                slot = &candidate;
-                break;
-            }
-        }
+Store::Slot& Store::SlotOf(const SectionKind& kind) {
+    if (kind.Position() < slots_.size() && slots_[kind.Position()].kind == &kind)
+        return slots_[kind.Position()];
+    for (auto& candidate : slots_) {
+        if (candidate.kind == &kind) return candidate;
     }
-    if (!slot) throw HostCtl::Lib::HostCtlException(std::string("unknown section kind ") + kind.Name());
-    if (!slot->data) {
-        try {
-            slot->data = slot->present ? kind.Parse(Raw(*slot)) : kind.Empty();
-        } catch (const SectionFault& fault) {
-            Refuse(fault.what());
-        }
-        // The content is in place before it is checked, so that a check of another section
-        // that looks back at this one finds it.
+    throw HostCtl::Lib::HostCtlException(std::string("unknown section kind ") + kind.Name());
+}
+
+void Store::ParseSlot(Slot& slot) {
+    if (slot.data) return;
+    try {
+        slot.data = slot.present ? slot.kind->Parse(Raw(slot)) : slot.kind->Empty();
+    } catch (const SectionFault& fault) {
+        Refuse(fault.what());
+    }
+}
+
+const SectionData& Store::Parsed(const SectionKind& kind) {
+    Slot& slot = SlotOf(kind);
+    ParseSlot(slot);
+    return *slot.data;
+}
+
+SectionData& Store::Get(const SectionKind& kind, bool forWrite) {
+    Slot& slot = SlotOf(kind);
+    ParseSlot(slot);
+    if (!slot.checked) {
+        // Marked before the checks run, so that a check of another section that looks back
+        // at this one finds it in place.
+        slot.checked = true;
         try {
             Checker checker(*this);
-            kind.Validate(*slot->data, checker);
+            kind.Validate(*slot.data, checker);
         } catch (const SectionFault& fault) {
-            slot->data.reset();
+            slot.data.reset();
+            slot.checked = false;
             Refuse(std::string(kind.Name()) + ": " + fault.what());
         } catch (...) {
-            slot->data.reset();
+            slot.data.reset();
+            slot.checked = false;
             throw;
         }
     }
-    if (forWrite) slot->dirty = true;
-    return *slot->data;
+    if (forWrite) slot.dirty = true;
+    return *slot.data;
 }
 
 void Store::LoadAll() {
@@ -438,6 +454,7 @@ void Store::Discard() {
     for (auto& slot : slots_) {
         if (!slot.dirty) continue;
         slot.data.reset();
+        slot.checked = false;
         slot.dirty = false;
     }
 }

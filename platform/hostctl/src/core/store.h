@@ -40,6 +40,9 @@ public:
     // The section's content, parsed and checked on first use (a missing section is empty).
     // forWrite marks it changed. Throws StateFileError when it is not acceptable.
     SectionData& Get(const SectionKind& kind, bool forWrite);
+    // The section's content, parsed but not necessarily checked: what the checks of other
+    // sections look up (names, references). Its own checks run when it is used itself.
+    const SectionData& Parsed(const SectionKind& kind);
     // Parses and checks every section.
     void LoadAll();
     // Marks every section changed so that the next export writes all of them in the
@@ -75,9 +78,13 @@ private:
         std::size_t end = 0;
         bool present = false;
         bool dirty = false;
+        bool checked = false;  // data has passed (or is passing) the section's checks
         std::unique_ptr<SectionData> data;
         std::unique_ptr<std::string> committed;  // the section's text since the last commit
     };
+
+    Slot& SlotOf(const SectionKind& kind);
+    void ParseSlot(Slot& slot);
 
     static constexpr std::string_view kHeader = "{\"version\":1";
     static constexpr std::string_view kTrailer = "\n}\n";

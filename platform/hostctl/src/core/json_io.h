@@ -199,6 +199,23 @@ void Append(Node& object, const char* key, V&& value) {
                          std::forward_as_tuple(std::forward<V>(value)));
 }
 
+inline void AppendAll(Node&) {}
+template <class V, class... Rest>
+void AppendAll(Node& object, const char* key, V&& value, Rest&&... rest) {
+    Append(object, key, std::forward<V>(value));
+    AppendAll(object, std::forward<Rest>(rest)...);
+}
+
+// An object of these members, in this order: Object("name", name, "mtu", mtu). The names
+// must be distinct.
+template <class... Members>
+Node Object(Members&&... members) {
+    Node object = Node::object();
+    object.get_ref<Node::object_t&>().reserve(sizeof...(Members) / 2);
+    AppendAll(object, std::forward<Members>(members)...);
+    return object;
+}
+
 // Hexadecimal text <-> bytes ("0a1b..."), for EEPROM and register images.
 std::vector<std::uint8_t> HexBytes(const In& in);
 std::string HexText(const std::vector<std::uint8_t>& bytes);
@@ -233,7 +250,7 @@ template <class S, class V, std::size_t N>
 Node WriteFields(const S& value, const Field<S, V> (&fields)[N]) {
     Node node = Node::object();
     for (const auto& field : fields)
-        node[field.key] = value.*field.member;
+        Append(node, field.key, value.*field.member);
     return node;
 }
 

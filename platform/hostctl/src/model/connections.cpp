@@ -58,18 +58,13 @@ Node Save(const ConnectionsSection& section) {
     for (const auto& stack : section.stacks) {
         Node list = Node::array();
         for (const auto& c : stack.connections) {
-            list.push_back({{"protocol", kConnectionProtocols[c.protocol < 3 ? c.protocol : 2]},
-                            {"recvQ", c.recvQ},
-                            {"sendQ", c.sendQ},
-                            {"localAddress", c.localAddress},
-                            {"localPort", c.localPort},
-                            {"foreignAddress", c.foreignAddress},
-                            {"foreignPort", c.foreignPort},
-                            {"state", c.state},
-                            {"worldId", c.worldId},
-                            {"ccAlgo", c.ccAlgo}});
+            list.push_back(Json::Object("protocol", kConnectionProtocols[c.protocol < 3 ? c.protocol : 2],
+                                        "recvQ", c.recvQ, "sendQ", c.sendQ, "localAddress", c.localAddress,
+                                        "localPort", c.localPort, "foreignAddress", c.foreignAddress,
+                                        "foreignPort", c.foreignPort, "state", c.state, "worldId", c.worldId,
+                                        "ccAlgo", c.ccAlgo));
         }
-        out.push_back({{"netstack", stack.netstack}, {"connections", std::move(list)}});
+        out.push_back(Json::Object("netstack", stack.netstack, "connections", std::move(list)));
     }
     return out;
 }

@@ -41,12 +41,8 @@ template <class Entry>
 Node SaveEntries(const std::vector<Entry>& entries) {
     Node out = Node::array();
     for (const auto& e : entries) {
-        out.push_back({{"address", e.address.GetStringAddress()},
-                       {"mac", e.mac},
-                       {"interface", e.interface},
-                       {"expiry", e.expiry},
-                       {"state", e.state},
-                       {"type", e.type}});
+        out.push_back(Json::Object("address", e.address.GetStringAddress(), "mac", e.mac, "interface",
+                                   e.interface, "expiry", e.expiry, "state", e.state, "type", e.type));
     }
     return out;
 }
@@ -65,9 +61,8 @@ void Load(const In& in, NeighborsSection& section) {
 Node Save(const NeighborsSection& section) {
     Node out = Node::array();
     for (const auto& stack : section.stacks) {
-        out.push_back({{"netstack", stack.netstack},
-                       {"ipv4", SaveEntries(stack.ipv4)},
-                       {"ipv6", SaveEntries(stack.ipv6)}});
+        out.push_back(Json::Object("netstack", stack.netstack, "ipv4", SaveEntries(stack.ipv4), "ipv6",
+                                   SaveEntries(stack.ipv6)));
     }
     return out;
 }

@@ -77,30 +77,28 @@ void Load(const In& in, PortsSection& section) {
 }
 
 Node Save(const PortsSection& section) {
+    using Json::Append;
     Node out = Node::array();
     for (const auto& p : section.ports) {
         Node filters = Node::array();
         for (const auto& f : p.filters) {
-            Node node = {{"name", f.name},
-                         {"valid", f.valid},
-                         {"direction", f.direction},
-                         {"extendedValid", f.extendedValid}};
+            Node node = Json::Object("name", f.name, "valid", f.valid, "direction", f.direction,
+                                     "extendedValid", f.extendedValid);
             for (const auto& field : kFilterCounters)
-                node[field.key] = f.*field.member;
+                Append(node, field.key, f.*field.member);
             filters.push_back(std::move(node));
         }
-        Node node = {{"id", p.id},
-                     {"switch", p.switchName},
-                     {"type", p.type < 5 && kPortTypes[p.type] ? kPortTypes[p.type] : "internal"}};
-        if (!p.portGroup.empty()) node["portGroup"] = p.portGroup;
-        if (!p.dvPortId.empty()) node["dvPortId"] = p.dvPortId;
-        node["client"] = p.client;
-        node["worldId"] = p.worldId;
-        node["mac"] = p.mac.GetStringAddress();
-        node["ipv4"] = p.ipv4.GetStringAddress();
-        node["teamUplink"] = p.teamUplink;
-        node["stats"] = Json::WriteFields(p.stats, kPortStats);
-        node["filters"] = std::move(filters);
+        Node node = Json::Object("id", p.id, "switch", p.switchName, "type",
+                                 p.type < 5 && kPortTypes[p.type] ? kPortTypes[p.type] : "internal");
+        if (!p.portGroup.empty()) Append(node, "portGroup", p.portGroup);
+        if (!p.dvPortId.empty()) Append(node, "dvPortId", p.dvPortId);
+        Append(node, "client", p.client);
+        Append(node, "worldId", p.worldId);
+        Append(node, "mac", p.mac.GetStringAddress());
+        Append(node, "ipv4", p.ipv4.GetStringAddress());
+        Append(node, "teamUplink", p.teamUplink);
+        Append(node, "stats", Json::WriteFields(p.stats, kPortStats));
+        Append(node, "filters", std::move(filters));
         out.push_back(std::move(node));
     }
     return out;

@@ -51,26 +51,22 @@ void Load(const In& in, RoutesSection& section) {
 }
 
 Node Save(const RoutesSection& section) {
+    using Json::Object;
     Node out = Node::array();
     for (const auto& stack : section.stacks) {
         Node v4 = Node::array();
         for (const auto& r : stack.ipv4) {
-            v4.push_back({{"network", r.network.GetStringAddress()},
-                          {"gateway", r.gateway.GetStringAddress()},
-                          {"interface", r.interface},
-                          {"source", r.source}});
+            v4.push_back(Object("network", r.network.GetStringAddress(), "gateway",
+                                r.gateway.GetStringAddress(), "interface", r.interface, "source", r.source));
         }
         Node v6 = Node::array();
         for (const auto& r : stack.ipv6) {
-            v6.push_back({{"network", r.network.GetStringAddress()},
-                          {"gateway", r.gateway.GetStringAddress()},
-                          {"interface", r.interface}});
+            v6.push_back(Object("network", r.network.GetStringAddress(), "gateway",
+                                r.gateway.GetStringAddress(), "interface", r.interface));
         }
-        out.push_back({{"netstack", stack.netstack},
-                       {"ipv4", std::move(v4)},
-                       {"ipv6", std::move(v6)},
-                       {"ipv4ConfigGateway", stack.ipv4ConfigGateway.GetStringAddress()},
-                       {"ipv6ConfigGateway", stack.ipv6ConfigGateway.GetStringAddress()}});
+        out.push_back(Object("netstack", stack.netstack, "ipv4", std::move(v4), "ipv6", std::move(v6),
+                             "ipv4ConfigGateway", stack.ipv4ConfigGateway.GetStringAddress(),
+                             "ipv6ConfigGateway", stack.ipv6ConfigGateway.GetStringAddress()));
     }
     return out;
 }

@@ -171,20 +171,9 @@ public:
 
     // The fields of record to show, in order. A named field the record lacks is skipped.
     std::vector<const MetaStruct::Field*> ShownFields(const MetaStruct& record) const {
-        std::optional<std::string> list;
-        const std::string& name = record.GetName();
-        // "table-columns" names no record: it serves the records whose fields it names, and
-        // leaves others (records nested in them) to show every field.
-        bool generic = false;
-        if (table_) {
-            list = parameters_.Get("table-columns:" + name);
-            if (!list) generic = static_cast<bool>(list = parameters_.Get("table-columns"));
-            if (!list) list = parameters_.Get("fields:" + name);
-        } else {
-            list = parameters_.Get("fields:" + name);
-            if (!list) list = parameters_.Get("table-columns:" + name);
-            if (!list) generic = static_cast<bool>(list = parameters_.Get("table-columns"));
-        }
+        const Rules& rules = RulesFor(record.GetName());
+        const std::optional<std::string>& list = rules.list;
+        const bool generic = rules.generic;
         std::vector<const MetaStruct::Field*> shown;
         const auto& fields = record.GetFields();
         if (!list) {
@@ -214,7 +203,7 @@ public:
 
     // The heading of a record in a list, or nothing.
     std::optional<std::string> Heading(const MetaStruct& record) const {
-        auto header = parameters_.Get("header:" + record.GetName());
+        const auto header = RulesFor(record.GetName()).header;  // a copy: Scalar below may look up others
         if (!header || *header == "<NONE>") return std::nullopt;
         std::string text;
         std::size_t pos = 0;
@@ -245,7 +234,13 @@ public:
     }
     // The unit of a record's field, if the output parameters give one.
     std::optional<std::string> Unit(const std::string& record, const std::string& field) const {
-        return parameters_.Get("units:" + record + "." + field);
+        const Rules& rules = RulesFor(record);
+        for (const auto& [name, unit] : rules.units) {
+            if (name == field) return unit;
+        }
+        auto unit = parameters_.Get("units:" + record + "." + field);
+        rules_.units.emplace_back(field, unit);  // rules_ is what RulesFor gave
+        return unit;
     }
     // The text of a value with its unit (looked up once per column by the caller).
     std::string Cell(const MetaObject* value, const std::optional<std::string>& unit) const {
@@ -333,9 +328,41 @@ public:
     const OutputParameters& parameters() const { return parameters_; }
 
 private:
+    // What the output parameters say about one kind of record, looked up once for the records
+    // of a list (they share their name) rather than for each.
+    struct Rules {
+        std::string record;
+        bool known = false;
+        std::optional<std::string> list;  // the fields to show
+        bool generic = false;             // the list came from the unqualified "table-columns"
+        std::optional<std::string> header;
+        std::vector<std::pair<std::string, std::optional<std::string>>> units;  // by field, as asked
+    };
+    const Rules& RulesFor(const std::string& name) const {
+        if (rules_.known && rules_.record == name) return rules_;
+        rules_ = Rules{};
+        rules_.record = name;
+        rules_.known = true;
+        // "table-columns" names no record: it serves the records whose fields it names, and
+        // leaves others (records nested in them) to show every field.
+        auto& list = rules_.list;
+        if (table_) {
+            list = parameters_.Get("table-columns:" + name);
+            if (!list) rules_.generic = static_cast<bool>(list = parameters_.Get("table-columns"));
+            if (!list) list = parameters_.Get("fields:" + name);
+        } else {
+            list = parameters_.Get("fields:" + name);
+            if (!list) list = parameters_.Get("table-columns:" + name);
+            if (!list) rules_.generic = static_cast<bool>(list = parameters_.Get("table-columns"));
+        }
+        rules_.header = parameters_.Get("header:" + name);
+        return rules_;
+    }
+
     const OutputParameters& parameters_;
     bool table_;
     bool raw_;
+    mutable Rules rules_;
 };
 
 // "show-header" (checked and made "true" or "false" when the user gave it).
@@ -1116,6 +1143,16 @@ void AppendJsonString(std::string& out, const std::string& text) {
     std::size_t size = text.size();
     std::size_t i = 0;
     while (i < size) {
+        // Printable ASCII that needs no escape goes in runs.
+        std::size_t run = i;
+        while (run < size && bytes[run] >= 0x20 && bytes[run] < 0x7f && bytes[run] != '"' &&
+               bytes[run] != '\\')
+            ++run;
+        if (run > i) {
+            out.append(text, i, run - i);
+            i = run;
+            continue;
+        }
         unsigned char c = bytes[i];
         if (c < 0x80) {
             switch (c) {

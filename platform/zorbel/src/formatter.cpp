@@ -723,6 +723,16 @@ void AppendXmlText(std::string& out, const std::string& text) {
     const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
     std::size_t i = 0;
     while (i < text.size()) {
+        // Printable ASCII that needs no escape goes in runs.
+        std::size_t run = i;
+        while (run < text.size() && bytes[run] >= 0x20 && bytes[run] < 0x7f && bytes[run] != '&' &&
+               bytes[run] != '<' && bytes[run] != '>' && bytes[run] != '"' && bytes[run] != '\'')
+            ++run;
+        if (run > i) {
+            out.append(text, i, run - i);
+            i = run;
+            continue;
+        }
         unsigned char c = bytes[i];
         if (c < 0x80) {
             switch (c) {
@@ -883,6 +893,15 @@ void AppendCsvField(std::string& out, const std::string& text) {
     const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
     std::size_t i = 0;
     while (i < text.size()) {
+        // Printable ASCII that needs no escape goes in runs.
+        std::size_t run = i;
+        while (run < text.size() && bytes[run] >= 0x20 && bytes[run] < 0x7f)
+            ++run;
+        if (run > i) {
+            clean.append(text, i, run - i);
+            i = run;
+            continue;
+        }
         unsigned char c = bytes[i];
         if (c < 0x80) {
             if ((c < 0x20 && c != '\t' && c != '\n' && c != '\r') || c == 0x7f) {
@@ -991,6 +1010,15 @@ void AppendKeyValueText(std::string& out, const std::string& text) {
     const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
     std::size_t i = 0;
     while (i < text.size()) {
+        // Printable ASCII that needs no escape goes in runs.
+        std::size_t run = i;
+        while (run < text.size() && bytes[run] >= 0x20 && bytes[run] < 0x7f && bytes[run] != '\\')
+            ++run;
+        if (run > i) {
+            out.append(text, i, run - i);
+            i = run;
+            continue;
+        }
         unsigned char c = bytes[i];
         if (c < 0x80) {
             switch (c) {

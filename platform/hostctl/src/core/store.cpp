@@ -392,16 +392,7 @@ std::string_view Store::Raw(const Slot& slot) const {
 }
 
 bool Store::HasChanges() const {
-    for (const auto& slot : slots_) {
-        if (!slot.data || !slot.dirty) continue;
-        std::string now = slot.kind->Serialize(*slot.data);
-        if (slot.present) {
-            if (Raw(slot) != now) return true;
-        } else if (now != slot.kind->Serialize(*slot.kind->Empty())) {
-            return true;
-        }
-    }
-    return false;
+    return Differs(TakeSnapshot());
 }
 
 bool Store::Differs(const Snapshot& snapshot) const {

@@ -103,37 +103,21 @@ void Load(const In& in, VSwitchesSection& section) {
 }
 
 Node Save(const VSwitchesSection& section) {
-    using Json::Append;
+    using Json::Object;
     Node out = Node::array();
     for (const auto& s : section.switches) {
         Node groups = Node::array();
         for (const auto& g : s.portGroups) {
-            Node group = Node::object();
-            Append(group, "name", g.name);
-            Append(group, "vlanId", g.vlanId);
-            Append(group, "policy", SavePolicy(g.policy));
-            Append(group, "activeClients", g.activeClients);
-            groups.push_back(std::move(group));
+            groups.push_back(Object("name", g.name, "vlanId", g.vlanId, "policy", SavePolicy(g.policy),
+                                    "activeClients", g.activeClients));
         }
-        Node beacon = Node::object();
-        Append(beacon, "enabled", s.beacon.enabled);
-        Append(beacon, "interval", s.beacon.interval);
-        Append(beacon, "threshold", s.beacon.threshold);
-        Append(beacon, "requiredBy", s.beacon.requiredBy);
-        Node node = Node::object();
-        Append(node, "name", s.name);
-        Append(node, "className", s.className);
-        Append(node, "numPorts", s.numPorts);
-        Append(node, "configuredPorts", s.configuredPorts);
-        Append(node, "usedPorts", s.usedPorts);
-        Append(node, "mtu", s.mtu);
-        Append(node, "cdpStatus", kCdpStatusNames[s.cdpStatus < 4 ? s.cdpStatus : 3]);
-        Append(node, "beacon", std::move(beacon));
-        Append(node, "uplinks", s.uplinks);
-        Append(node, "policy", SavePolicy(s.policy));
-        Append(node, "capabilities", SaveCapabilities(s.capabilities));
-        Append(node, "portGroups", std::move(groups));
-        out.push_back(std::move(node));
+        out.push_back(Object("name", s.name, "className", s.className, "numPorts", s.numPorts,
+                             "configuredPorts", s.configuredPorts, "usedPorts", s.usedPorts, "mtu", s.mtu,
+                             "cdpStatus", kCdpStatusNames[s.cdpStatus < 4 ? s.cdpStatus : 3], "beacon",
+                             Object("enabled", s.beacon.enabled, "interval", s.beacon.interval, "threshold",
+                                    s.beacon.threshold, "requiredBy", s.beacon.requiredBy),
+                             "uplinks", s.uplinks, "policy", SavePolicy(s.policy), "capabilities",
+                             SaveCapabilities(s.capabilities), "portGroups", std::move(groups)));
     }
     return out;
 }

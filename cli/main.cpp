@@ -13,6 +13,7 @@
 #include <iostream>
 #include <memory>
 #include <sstream>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -97,6 +98,15 @@ std::vector<std::string> PluginDirectories(const GlobalOptions& options) {
     return {installed};
 }
 
+// Opens the session on the host the options select: the simulated host's state file, or the
+// Linux machine itself.
+std::unique_ptr<HostCtl::Lib::HostSession> OpenSession(const GlobalOptions& options) {
+    using HostCtl::Lib::HostSession;
+    if (HostCtl::Lib::ResolveBackend(options.backend) == HostCtl::Lib::BackendKind::kLinux)
+        return HostSession::OpenLinux();
+    return HostSession::OpenFile(HostCtl::Lib::ResolveStatePath(options.statePath));
+}
+
 // Output held back until the state is written: a stream into a string that grows by what is
 // written (a whole listing comes at once), with no buffer of its own to copy from.
 class HeldOutput : public std::streambuf {
@@ -130,7 +140,7 @@ int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invo
     int status = Zorbel::AutoCli::EXIT_UNEXPECTED;
     std::unique_ptr<HostSession> session;
     try {
-        session = HostSession::OpenFile(HostCtl::Lib::ResolveStatePath(options.statePath));
+        session = OpenSession(options);
         dispatcher.KeepLastResult(true);
         status = dispatcher.Execute(invocation, options, out, err);
         if (status == Zorbel::AutoCli::EXIT_OK || status == Zorbel::AutoCli::EXIT_FAILED) session->Commit();
@@ -253,12 +263,14 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
         } else if (!Zorbel::AutoCli::ParseGlobalOptions(words, own, rest, error)) {
             err << "Error: " << error << '\n';
             status = Zorbel::AutoCli::EXIT_REFUSED;
-        } else if (!own.statePath.empty() || !own.pluginDirs.empty() || !own.batch.empty() || own.atomic) {
+        } else if (!own.statePath.empty() || !own.pluginDirs.empty() || !own.batch.empty() || own.atomic ||
+                   !own.backend.empty()) {
             err << "Error: only --formatter and --format-param may stand before the words of a batch line\n";
             status = Zorbel::AutoCli::EXIT_REFUSED;
         } else {
             GlobalOptions lineOptions = own;
             lineOptions.statePath = options.statePath;
+            lineOptions.backend = options.backend;
             lineOptions.pluginDirs = options.pluginDirs;
             if (!own.formatterGiven) {
                 lineOptions.formatter = options.formatter;
@@ -271,8 +283,7 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             status = prepared.status;
             if (prepared.ready) {
                 try {
-                    if (!session)
-                        session = HostSession::OpenFile(HostCtl::Lib::ResolveStatePath(options.statePath));
+                    if (!session) session = OpenSession(options);
                     status = dispatcher.Execute(prepared.invocation, lineOptions, out, err);
                     if (!options.atomic) {
                         // As for a single command line: a command that ran to its end is
@@ -335,6 +346,22 @@ int Main(int argc, char** argv) {
     std::vector<std::string> rest;
     std::string error;
     if (!Zorbel::AutoCli::ParseGlobalOptions(args, options, rest, error)) {
+        std::cerr << "Error: " << error
+                  << "\nUsage: hadrocli [global options] NAMESPACE... COMMAND [options]; "
+                  << "see 'hadrocli --help'.\n";
+        return Zorbel::AutoCli::EXIT_REFUSED;
+    }
+
+    try {
+        if (HostCtl::Lib::ResolveBackend(options.backend) == HostCtl::Lib::BackendKind::kLinux &&
+            !options.statePath.empty()) {
+            error =
+                "option --state names the simulated host's state file; it does not go with --backend=linux";
+        }
+    } catch (const std::invalid_argument& e) {
+        error = Zorbel::Format::TerminalSafe(e.what());
+    }
+    if (!error.empty()) {
         std::cerr << "Error: " << error
                   << "\nUsage: hadrocli [global options] NAMESPACE... COMMAND [options]; "
                   << "see 'hadrocli --help'.\n";

@@ -3,8 +3,12 @@
 # it installs only what is missing.
 set -euo pipefail
 
-packages=(cmake g++ ninja-build libboost1.81-dev nlohmann-json3-dev libgtest-dev libgmock-dev
-          libbenchmark-dev clang libclang-rt-dev valgrind zsh)
+packages=(cmake g++ ninja-build pkg-config libboost1.81-dev nlohmann-json3-dev libgtest-dev libgmock-dev
+          libbenchmark-dev clang libclang-rt-dev valgrind zsh
+          # the Linux host: netlink, ethtool, xfrm, sock_diag, nftables
+          libnl-3-dev libnl-route-3-dev libnl-genl-3-dev libnl-xfrm-3-dev libnl-idiag-3-dev libnftables-dev
+          # the tools its tests ask for the kernel's own view
+          iproute2 nftables ethtool util-linux)
 
 missing=()
 for p in "${packages[@]}"; do

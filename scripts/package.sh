@@ -8,7 +8,7 @@ dir=${1:-$root/build}
 if [ ! -f "$dir/CMakeCache.txt" ]; then
     cmake -S "$root" -B "$dir" -G Ninja -DCMAKE_BUILD_TYPE=Release -DHADRO_BENCH=OFF >/dev/null
 fi
-cmake --build "$dir" --parallel "${HADRO_JOBS:-2}" --target hadrocli hadrosim network hadro_generated >/dev/null
+cmake --build "$dir" --parallel "${HADRO_JOBS:-2}" --target hadrocli hadrosim network hostctl_linux hadro_generated >/dev/null
 # Only what the package holds is built (install does not depend on "all").
 rm -rf "$dir/package"
 (cd "$dir" && cpack -G DEB >/dev/null)

@@ -208,7 +208,7 @@ std::string Data(const Tables& tables, const std::string& declare, const std::st
 // forms. @ID@ is the program name as an identifier, @PROG@ the program.
 const char* const kBash = R"BASH(
 # The global options that take a value, given as the next word or after '='.
-_@ID@_global_options=$'--formatter\n--format-param\n--state\n--plugin-dir\n--batch\n--atomic\n--list-commands\n--manual\n--completion\n--help\n--version'
+_@ID@_global_options=$'--formatter\n--format-param\n--backend\n--state\n--plugin-dir\n--batch\n--atomic\n--list-commands\n--manual\n--completion\n--help\n--version'
 
 # Adds the candidates that start with the typed text ($2) to COMPREPLY, after $1 (the part of
 # the word readline replaces ahead of the value). Names with blanks or quotes are escaped
@@ -232,7 +232,7 @@ _@ID@_add() {
 }
 
 # The names of one kind from the host, asked of the program with the global options of the
-# line (--state, --plugin-dir): one keyvalue line per name, escapes undone.
+# line (--backend, --state, --plugin-dir): one keyvalue line per name, escapes undone.
 _@ID@_names() {
     local source=${_@ID@_sources[$1]} line name program=${COMP_WORDS[0]}
     _@ID@_found=()
@@ -255,6 +255,7 @@ _@ID@_global_value() {
     case $option in
         --formatter) mapfile -t candidates <<< "$_@ID@_formatters" ;;
         --completion) candidates=(bash zsh) ;;
+        --backend) candidates=(simulated linux) ;;
         --manual) candidates=(man markdown) ;;
         --format-param) candidates=(fields= show-header=false show-header=true) ;;
         --state|--batch) mapfile -t candidates < <(compgen -f -- "$typed") ;;
@@ -305,9 +306,9 @@ _@ID@() {
     while ((i < n)); do
         w=${words[i]}
         case $w in
-            --state|--plugin-dir) _@ID@_globals+=("$w=${words[i + 1]}"); i=$((i + 2)); continue ;;
+            --state|--plugin-dir|--backend) _@ID@_globals+=("$w=${words[i + 1]}"); i=$((i + 2)); continue ;;
             --formatter|--format-param|--completion|--batch) i=$((i + 2)); continue ;;
-            --state=*|--plugin-dir=*) _@ID@_globals+=("$w") ;;
+            --state=*|--plugin-dir=*|--backend=*) _@ID@_globals+=("$w") ;;
             -*) ;;
             *) break ;;
         esac
@@ -407,10 +408,10 @@ complete -F _@ID@ @PROG@
 )BASH";
 
 const char* const kZsh = R"ZSH(
-_@ID@_global_options=$'--formatter\n--format-param\n--state\n--plugin-dir\n--batch\n--atomic\n--list-commands\n--manual\n--completion\n--help\n--version'
+_@ID@_global_options=$'--formatter\n--format-param\n--backend\n--state\n--plugin-dir\n--batch\n--atomic\n--list-commands\n--manual\n--completion\n--help\n--version'
 
 # The names of one kind from the host, asked of the program with the global options of the
-# line (--state, --plugin-dir): one keyvalue line per name, escapes undone.
+# line (--backend, --state, --plugin-dir): one keyvalue line per name, escapes undone.
 _@ID@_names() {
     local source=${_@ID@_sources[$1]} line name program=${words[1]}
     reply=()
@@ -443,6 +444,7 @@ _@ID@_global_value() {
     case $1 in
         --formatter) compadd -- "${(@f)_@ID@_formatters}" ;;
         --completion) compadd -- bash zsh ;;
+        --backend) compadd -- simulated linux ;;
         --manual) compadd -- man markdown ;;
         --format-param) compadd -S '' -- fields= show-header=false show-header=true ;;
         --state|--batch) _files ;;
@@ -471,9 +473,9 @@ _@ID@() {
     while ((i < n)); do
         w=${words[i]}
         case $w in
-            --state|--plugin-dir) _@ID@_globals+=("$w=${words[i + 1]}"); i=$((i + 2)); continue ;;
+            --state|--plugin-dir|--backend) _@ID@_globals+=("$w=${words[i + 1]}"); i=$((i + 2)); continue ;;
             --formatter|--format-param|--completion|--batch) i=$((i + 2)); continue ;;
-            --state=*|--plugin-dir=*) _@ID@_globals+=("$w") ;;
+            --state=*|--plugin-dir=*|--backend=*) _@ID@_globals+=("$w") ;;
             -*) ;;
             *) break ;;
         esac

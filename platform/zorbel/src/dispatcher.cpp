@@ -87,6 +87,13 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
                 return false;
             }
             options.statePath = value;
+        } else if (TakeGlobalValue(args, i, "backend", value, error)) {
+            if (!error.empty()) return false;
+            if (value.empty()) {
+                error = "option --backend needs a host: simulated or linux";
+                return false;
+            }
+            options.backend = value;
         } else if (TakeGlobalValue(args, i, "plugin-dir", value, error)) {
             if (!error.empty()) return false;
             options.pluginDirs.push_back(value);

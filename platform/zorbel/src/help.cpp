@@ -236,7 +236,11 @@ std::vector<std::pair<std::string, std::string>> GlobalOptionRows() {
         {"--format-param=KEY=VALUE",
          "Display parameter, repeatable: fields=A,B (choose and order the fields), show-header=false "
          "(table, csv)."},
-        {"--state=PATH", "Host state file (default: $HADRO_STATE, else $XDG_STATE_HOME/hadro/host.json)."},
+        {"--backend=HOST",
+         "The host to manage: simulated (its whole state in one file) or linux (the network of this "
+         "machine); default: $HADRO_BACKEND, else simulated."},
+        {"--state=PATH",
+         "Simulated host state file (default: $HADRO_STATE, else $XDG_STATE_HOME/hadro/host.json)."},
         {"--plugin-dir=DIR",
          "Load plug-ins from DIR (default: $HADRO_PLUGIN_PATH, else the installed ones)."},
         {"--list-commands", "List every command with its description."},

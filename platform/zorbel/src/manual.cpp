@@ -171,7 +171,12 @@ std::string ManPage(const std::string& program, NamespaceNode& root) {
         ".TP\n.B 3\nan unexpected failure (an unreadable or unwritable state file, an unhandled error)\n";
     out +=
         ".SH ENVIRONMENT\n"
-        ".TP\n.B HADRO_STATE\nthe host state file when \\fB\\-\\-state\\fR is not given\n"
+        ".TP\n.B HADRO_BACKEND\nthe host to manage (\\fBsimulated\\fR or \\fBlinux\\fR) when "
+        "\\fB\\-\\-backend\\fR is not given\n"
+        ".TP\n.B HADRO_STATE\nthe simulated host's state file when \\fB\\-\\-state\\fR is not given\n"
+        ".TP\n.B HADRO_LINUX_CONF\nthe Linux host's configuration (default \\fI/etc/hadro/linux.conf\\fR)\n"
+        ".TP\n.B HADRO_LINUX_STATE\nthe Linux host's own document (default "
+        "\\fI/var/lib/hadro/linux.json\\fR)\n"
         ".TP\n.B HADRO_PLUGIN_PATH\nplug-in directories, colon-separated, when \\fB\\-\\-plugin\\-dir\\fR is "
         "not "
         "given\n"

@@ -192,7 +192,7 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
             parameter = spec.FindParameter(name);
             if (!parameter) {
                 error = "unknown option --" + Shown(name);
-                if (name == "formatter" || name == "state" || name == "plugin-dir" ||
+                if (name == "formatter" || name == "state" || name == "plugin-dir" || name == "backend" ||
                     name == "format-param") {
                     error += " (global options go before the first word)";
                 }

@@ -1,8 +1,10 @@
-// Host sessions: one command line is one transaction on the simulated host.
+// Host sessions: one command line is one transaction on the host.
 //
-// A program opens a session on the state file before it runs a command and commits it
-// afterwards. Exactly one session is current at a time; the library's implementation
-// objects reach the host model through it and throw HostCtlException when none is open.
+// A program opens a session before it runs a command and commits it afterwards: on the
+// simulated host (the default), whose whole state lives in one file, or on the Linux machine
+// the program runs on. Exactly one session is current at a time; the library's
+// implementation objects reach the host through it and throw HostCtlException when none is
+// open.
 #pragma once
 
 #include <exception>
@@ -29,6 +31,17 @@ private:
 // no home directory can be found for the last case.
 std::string ResolveStatePath(const std::string& given);
 
+// The hosts a session can manage.
+enum class BackendKind {
+    kSimulated,  // the simulated host and its state file
+    kLinux,      // the network of the Linux machine the program runs on
+};
+
+// The host named by given ("simulated" or "linux") when not empty, else by $HADRO_BACKEND
+// when set and not empty, else the simulated host. Throws std::invalid_argument, whose
+// message names the option or variable, the value and the choices, for any other name.
+BackendKind ResolveBackend(const std::string& given);
+
 class HostSession {
 public:
     enum class OpenMode {
@@ -47,6 +60,11 @@ public:
     static std::unique_ptr<HostSession> InMemory(const std::string& json);
     // An in-memory session on the default host.
     static std::unique_ptr<HostSession> InMemoryDefault();
+    // A session on the Linux machine this program runs on: the kernel is read at each call,
+    // and what the kernel has no notion of is kept in the Linux host's own document. Throws
+    // StateFileError when the Linux host cannot be used (its module, its configuration or its
+    // document).
+    static std::unique_ptr<HostSession> OpenLinux();
 
     // The current session, or nullptr.
     static HostSession* Current();
@@ -62,8 +80,8 @@ public:
     ~HostSession();
 
     // Writes the document back when something changed (file sessions; in memory this only
-    // makes the current state the committed one). Throws StateFileError on failure; the
-    // old file then stays as it was.
+    // makes the current state the committed one; on the Linux host its own document). Throws
+    // StateFileError on failure; the old file then stays as it was.
     void Commit();
     // Forgets every change made since the session was opened or last committed.
     void Rollback();
@@ -76,8 +94,12 @@ public:
     void Replace(const std::string& json, const std::string& origin);
     // Replaces the whole document by the default host.
     void Reset();
-    // The state file's path; empty for an in-memory session.
+    // (Export, Replace and Reset concern the simulated host's document: on the Linux host
+    // they throw StateFileError.)
+    // The state file's path; empty for an in-memory session and on the Linux host.
     const std::string& GetPath() const;
+    // Which host the session manages.
+    BackendKind GetBackend() const;
 
     struct Impl;
 

@@ -1,5 +1,6 @@
 #include "core/hook.h"
 
+#include "backend/host.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
 #include "model/faults.h"
@@ -9,7 +10,9 @@ namespace TknCtl::Lib {
 
 std::optional<std::string> TryEnter(std::string_view operation, std::string_view target,
                                     std::string_view arguments) {
-    CurrentStore();  // throws when no session is open
+    RequireSession();
+    // Faults and the journal belong to the simulated host's state file.
+    if (RealHost()) return std::nullopt;
 
     if (Read<Model::JournalSection>().enabled) {
         std::string line(operation);

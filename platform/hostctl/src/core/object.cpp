@@ -5,7 +5,7 @@
 namespace TknCtl::Lib {
 
 TknCtlObject::TknCtlObject() {
-    CurrentStore();
+    RequireSession();
 }
 
 TknCtlObject::~TknCtlObject() = default;

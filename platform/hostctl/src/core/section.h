@@ -78,6 +78,9 @@ const SectionKind* FindSection(std::string_view name);
 
 // The document of the current session; throws HostCtlException when no session is open.
 Store& CurrentStore();
+// Throws HostCtlException("no host session is open") when no session is open, whichever
+// host it manages.
+void RequireSession();
 // The content of one section of a document, parsed and checked on first use.
 SectionData& Access(Store& store, const SectionKind& kind, bool forWrite);
 const SectionData& Parsed(Store& store, const SectionKind& kind);

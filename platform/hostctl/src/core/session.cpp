@@ -19,6 +19,7 @@
 #include <string_view>
 #include <vector>
 
+#include "core/backend.h"
 #include "core/embedded.h"
 #include "core/store.h"
 #include "core/text.h"
@@ -38,7 +39,13 @@ namespace {
 constexpr off_t kMaxStateSize = 256 * 1024 * 1024;
 
 HostSession* g_current = nullptr;
-Store* g_store = nullptr;  // the current session's document
+Store* g_store = nullptr;                     // the current session's document (simulated host)
+TknCtl::Backend::Host* g_realHost = nullptr;  // the current session's real host
+
+[[noreturn]] void NotOnRealHost(const char* what) {
+    throw StateFileError(std::string(what) + " concerns the simulated host's state file, not the " +
+                         g_realHost->Describe());
+}
 
 std::string ErrnoText(int error) {
     return std::strerror(error);
@@ -172,8 +179,9 @@ std::string ResolveStatePath(const std::string& given) {
 }
 
 struct HostSession::Impl {
-    std::unique_ptr<Store> store;
-    std::string path;  // empty in memory
+    std::unique_ptr<Store> store;                     // the simulated host
+    std::unique_ptr<TknCtl::Backend::Host> realHost;  // a real host
+    std::string path;                                 // empty in memory
     int lockFd = -1;
     bool mustWrite = false;  // the file does not exist yet
     bool existed = false;
@@ -190,12 +198,14 @@ HostSession::HostSession(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {
     if (g_current) throw HostCtlException("a host session is already open");
     g_current = this;
     g_store = impl_->store.get();
+    g_realHost = impl_->realHost.get();
 }
 
 HostSession::~HostSession() {
     if (g_current == this) {
         g_current = nullptr;
         g_store = nullptr;
+        g_realHost = nullptr;
     }
 }
 
@@ -225,6 +235,13 @@ std::unique_ptr<HostSession> HostSession::InMemoryDefault() {
     session->impl_->store->RewriteAll();
     session->impl_->store->Rebase(session->impl_->store->Export());
     return session;
+}
+
+std::unique_ptr<HostSession> HostSession::OpenLinux() {
+    if (g_current) throw HostCtlException("a host session is already open");
+    auto impl = std::make_unique<Impl>();
+    impl->realHost = TknCtl::Backend::OpenLinuxHost();
+    return std::unique_ptr<HostSession>(new HostSession(std::move(impl)));
 }
 
 std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, OpenMode openMode) {
@@ -348,6 +365,7 @@ void HostSession::Impl::WriteFile(const std::vector<std::string_view>& pieces) {
 }
 
 void HostSession::Commit() {
+    if (impl_->realHost) return impl_->realHost->Commit();
     // Each changed section is serialized once: for telling whether it really changed, and
     // then for writing.
     Store::Snapshot snapshot = impl_->store->TakeSnapshot();
@@ -358,18 +376,22 @@ void HostSession::Commit() {
 }
 
 void HostSession::Rollback() {
+    if (impl_->realHost) return impl_->realHost->Discard();
     impl_->store->Discard();
 }
 
 bool HostSession::HasChanges() const {
+    if (impl_->realHost) return impl_->realHost->HasChanges();
     return impl_->mustWrite || impl_->store->HasChanges();
 }
 
 std::string HostSession::Export() const {
+    if (impl_->realHost) NotOnRealHost("exporting");
     return impl_->store->Export();
 }
 
 void HostSession::Replace(const std::string& json, const std::string& origin) {
+    if (impl_->realHost) NotOnRealHost("replacing the state");
     Store checked(json, origin);
     checked.LoadAll();
     checked.RewriteAll();
@@ -387,13 +409,32 @@ const std::string& HostSession::GetPath() const {
     return impl_->path;
 }
 
+BackendKind HostSession::GetBackend() const {
+    return impl_->realHost ? BackendKind::kLinux : BackendKind::kSimulated;
+}
+
 }  // namespace HostCtl::Lib
 
 namespace TknCtl::Lib {
 
 Store& CurrentStore() {
-    if (!HostCtl::Lib::g_store) throw HostCtl::Lib::HostCtlException("no host session is open");
+    if (!HostCtl::Lib::g_store) {
+        // An operation that has no counterpart on the real host reached for the model.
+        if (HostCtl::Lib::g_realHost) {
+            throw HostCtl::Lib::HostCtlException("This operation is not available on the " +
+                                                 HostCtl::Lib::g_realHost->Describe());
+        }
+        throw HostCtl::Lib::HostCtlException("no host session is open");
+    }
     return *HostCtl::Lib::g_store;
+}
+
+void RequireSession() {
+    if (!HostCtl::Lib::g_current) throw HostCtl::Lib::HostCtlException("no host session is open");
+}
+
+Backend::Host* RealHost() {
+    return HostCtl::Lib::g_realHost;
 }
 
 }  // namespace TknCtl::Lib

@@ -2,6 +2,8 @@
 #include <algorithm>
 #include <cctype>
 
+#include "backend/dns.h"
+#include "backend/host.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -61,6 +63,11 @@ DnsConfigImpl::DnsConfigImpl(const std::string& netstack) : netstack_(netstack) 
 DnsConfigImpl::~DnsConfigImpl() = default;
 
 void DnsConfigImpl::Load() {
+    if (auto* host = Lib::RealHost()) {
+        host->GetDns().Read(netstack_, servers_, searchDomains_);
+        loaded_ = true;
+        return;
+    }
     if (!Lib::Read<Model::NetstacksSection>().Find(netstack_))
         throw HostCtlException("Netstack instance " + Lib::Quote(netstack_) + " does not exist");
     const auto* stack = Lib::Read<Model::DnsSection>().Find(netstack_);
@@ -141,6 +148,7 @@ void DnsConfigImpl::RemoveSearchDomain(std::string domain) {
 void DnsConfigImpl::SaveConfig() {
     Lib::Enter("TknCtl::Network::DnsConfigImpl::SaveConfig", netstack_);
     LoadIfStale();
+    if (auto* host = Lib::RealHost()) return host->GetDns().Write(netstack_, servers_, searchDomains_);
     const auto* current = Lib::Read<Model::DnsSection>().Find(netstack_);
     if (current && current->servers == servers_ && current->searchDomains == searchDomains_) return;
     if (!current && servers_.empty() && searchDomains_.empty()) return;

@@ -25,6 +25,7 @@ enum ExitStatus : int {
 struct GlobalOptions {
     std::string formatter;  // empty: the command's default, else "simple"
     bool formatterGiven = false;
+    std::string backend;    // --backend: the host to manage (checked by the program); empty: not given
     std::string statePath;  // empty: not given
     std::vector<std::string> pluginDirs;
     bool listCommands = false;

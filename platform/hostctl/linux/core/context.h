@@ -1,0 +1,57 @@
+// What every area of the Linux host shares within one session: the configuration, the host's
+// own document, the netstacks (network namespaces) and the discipline of changes.
+#pragma once
+
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "core/config.h"
+#include "core/document.h"
+#include "kernel/netlink.h"
+
+namespace TknCtl::Linux {
+
+class Context {
+public:
+    // The netstack of the namespace the program runs in.
+    static constexpr const char* kDefaultNetstack = "defaultTcpipStack";
+    // The refusal of a change without the privilege it needs.
+    static constexpr const char* kNeedsRoot = "Changing the host's network needs root (CAP_NET_ADMIN)";
+
+    explicit Context(Config config);
+
+    const Config& GetConfig() const { return config_; }
+    Document& GetDocument() { return document_; }
+
+    // Every operation that changes the host calls this before it changes anything: without
+    // CAP_NET_ADMIN it throws HostCtlException(kNeedsRoot); then it takes the document's lock
+    // (once per session) so that what the command stores lands on what is there now.
+    void BeginChange();
+    // Whether the program has CAP_NET_ADMIN.
+    static bool HasNetAdmin();
+
+    // The netstacks the kernel has: the default first, then the named namespaces of
+    // /run/netns in name order.
+    std::vector<std::string> Netstacks() const;
+    bool HasNetstack(const std::string& netstack) const;
+    // The namespace of a netstack the kernel has; throws HostCtlException("Netstack instance
+    // 'NAME' does not exist") for any other. An empty name is the default netstack.
+    Kernel::Namespace NamespaceOf(const std::string& netstack) const;
+
+    // A warning for the user (a netstack left out of a listing, say): one line on stderr,
+    // each text once per session.
+    void Warn(const std::string& text);
+
+    bool HasChanges() const { return document_.HasChanges(); }
+    void Commit() { document_.Commit(); }
+    void Discard() { document_.Discard(); }
+
+private:
+    Config config_;
+    Document document_;
+    std::set<std::string> warned_;
+};
+
+}  // namespace TknCtl::Linux

@@ -1,0 +1,158 @@
+#include "kernel/links.h"
+
+#include <linux/if.h>
+#include <netlink/cache.h>
+#include <netlink/msg.h>
+#include <netlink/netlink.h>
+#include <netlink/route/link.h>
+
+#include <cstring>
+#include <memory>
+
+#include "hostctl/exception.h"
+
+namespace TknCtl::Linux::Kernel {
+
+using HostCtl::Lib::HostCtlException;
+
+namespace {
+
+struct CacheFree {
+    void operator()(nl_cache* cache) const { nl_cache_free(cache); }
+};
+struct LinkPut {
+    void operator()(rtnl_link* link) const { rtnl_link_put(link); }
+};
+struct AddrPut {
+    void operator()(nl_addr* addr) const { nl_addr_put(addr); }
+};
+using Cache = std::unique_ptr<nl_cache, CacheFree>;
+using LinkObject = std::unique_ptr<rtnl_link, LinkPut>;
+
+std::string AddressText(nl_addr* addr) {
+    if (!addr || nl_addr_get_len(addr) == 0) return {};
+    char buffer[128];
+    nl_addr2str(addr, buffer, sizeof(buffer));
+    std::string text = buffer;
+    return text == "none" ? std::string() : text;
+}
+
+Cache LinkCache(const Namespace& ns) {
+    nl_cache* cache = nullptr;
+    Check(rtnl_link_alloc_cache(RouteSocket(ns), AF_UNSPEC, &cache), "cannot list the network devices");
+    return Cache(cache);
+}
+
+}  // namespace
+
+Link LinkFromObject(rtnl_link* object) {
+    Link link;
+    link.index = rtnl_link_get_ifindex(object);
+    if (const char* name = rtnl_link_get_name(object)) link.name = name;
+    if (const char* kind = rtnl_link_get_type(object)) link.kind = kind;
+    link.mac = AddressText(rtnl_link_get_addr(object));
+    link.broadcast = AddressText(rtnl_link_get_broadcast(object));
+    link.mtu = rtnl_link_get_mtu(object);
+    link.flags = rtnl_link_get_flags(object);
+    link.up = link.flags & IFF_UP;
+    link.lowerUp = link.flags & IFF_LOWER_UP;
+    link.loopback = link.flags & IFF_LOOPBACK;
+    char state[32];
+    rtnl_link_operstate2str(rtnl_link_get_operstate(object), state, sizeof(state));
+    link.operState = state;
+    link.master = rtnl_link_get_master(object);
+    link.peer = rtnl_link_get_link(object);
+    link.txQueueLength = rtnl_link_get_txqlen(object);
+    link.numTxQueues = rtnl_link_get_num_tx_queues(object);
+    link.numRxQueues = rtnl_link_get_num_rx_queues(object);
+    auto stat = [&](rtnl_link_stat_id_t id) { return rtnl_link_get_stat(object, id); };
+    auto& s = link.stats;
+    s.rxPackets = stat(RTNL_LINK_RX_PACKETS);
+    s.txPackets = stat(RTNL_LINK_TX_PACKETS);
+    s.rxBytes = stat(RTNL_LINK_RX_BYTES);
+    s.txBytes = stat(RTNL_LINK_TX_BYTES);
+    s.rxErrors = stat(RTNL_LINK_RX_ERRORS);
+    s.txErrors = stat(RTNL_LINK_TX_ERRORS);
+    s.rxDropped = stat(RTNL_LINK_RX_DROPPED);
+    s.txDropped = stat(RTNL_LINK_TX_DROPPED);
+    s.multicast = stat(RTNL_LINK_MULTICAST);
+    s.collisions = stat(RTNL_LINK_COLLISIONS);
+    s.rxLengthErrors = stat(RTNL_LINK_RX_LEN_ERR);
+    s.rxOverErrors = stat(RTNL_LINK_RX_OVER_ERR);
+    s.rxCrcErrors = stat(RTNL_LINK_RX_CRC_ERR);
+    s.rxFrameErrors = stat(RTNL_LINK_RX_FRAME_ERR);
+    s.rxFifoErrors = stat(RTNL_LINK_RX_FIFO_ERR);
+    s.rxMissedErrors = stat(RTNL_LINK_RX_MISSED_ERR);
+    s.txAbortedErrors = stat(RTNL_LINK_TX_ABORT_ERR);
+    s.txCarrierErrors = stat(RTNL_LINK_TX_CARRIER_ERR);
+    s.txFifoErrors = stat(RTNL_LINK_TX_FIFO_ERR);
+    s.txHeartbeatErrors = stat(RTNL_LINK_TX_HBEAT_ERR);
+    s.txWindowErrors = stat(RTNL_LINK_TX_WIN_ERR);
+    return link;
+}
+
+std::optional<Link> ParseLink(nl_msg* message) {
+    std::optional<Link> out;
+    auto take = [](nl_object* object, void* arg) {
+        if (std::strcmp(nl_object_get_type(object), "route/link") == 0)
+            *static_cast<std::optional<Link>*>(arg) = LinkFromObject(reinterpret_cast<rtnl_link*>(object));
+    };
+    nl_msg_parse(message, take, &out);
+    return out;
+}
+
+std::vector<Link> ListLinks(const Namespace& ns) {
+    Cache cache = LinkCache(ns);
+    std::vector<Link> links;
+    links.reserve(static_cast<std::size_t>(nl_cache_nitems(cache.get())));
+    for (nl_object* object = nl_cache_get_first(cache.get()); object; object = nl_cache_get_next(object))
+        links.push_back(LinkFromObject(reinterpret_cast<rtnl_link*>(object)));
+    return links;
+}
+
+std::optional<Link> FindLink(const Namespace& ns, const std::string& name) {
+    rtnl_link* object = nullptr;
+    int error = rtnl_link_get_kernel(RouteSocket(ns), 0, name.c_str(), &object);
+    if (error == -NLE_OBJ_NOTFOUND || error == -NLE_NODEV) return std::nullopt;
+    Check(error, "cannot read network device " + name);
+    LinkObject owned(object);
+    return LinkFromObject(object);
+}
+
+nl_msg* BuildLinkChange(int index, const LinkChange& change) {
+    LinkObject original(rtnl_link_alloc());
+    LinkObject wanted(rtnl_link_alloc());
+    if (!original || !wanted) throw HostCtlException("out of memory");
+    rtnl_link_set_ifindex(original.get(), index);
+    if (change.up) {
+        if (*change.up) {
+            rtnl_link_set_flags(wanted.get(), IFF_UP);
+        } else {
+            rtnl_link_unset_flags(wanted.get(), IFF_UP);
+        }
+    }
+    if (change.mtu) rtnl_link_set_mtu(wanted.get(), *change.mtu);
+    if (change.mac) {
+        nl_addr* addr = nullptr;
+        if (nl_addr_parse(change.mac->c_str(), AF_LLC, &addr) < 0)
+            throw HostCtlException("Invalid MAC address " + *change.mac);
+        std::unique_ptr<nl_addr, AddrPut> owned(addr);
+        rtnl_link_set_addr(wanted.get(), addr);
+    }
+    if (change.master) rtnl_link_set_master(wanted.get(), *change.master);
+    nl_msg* message = nullptr;
+    Check(rtnl_link_build_change_request(original.get(), wanted.get(), 0, &message),
+          "cannot build a request to change a network device");
+    return message;
+}
+
+void ChangeLink(const Namespace& ns, const std::string& name, const LinkChange& change) {
+    if (change.Empty()) return;
+    auto link = FindLink(ns, name);
+    if (!link) throw HostCtlException("Network device " + name + " does not exist");
+    nl_msg* message = BuildLinkChange(link->index, change);
+    int error = nl_send_sync(RouteSocket(ns), message);  // frees the message
+    Check(error, "Cannot change network device " + name);
+}
+
+}  // namespace TknCtl::Linux::Kernel

@@ -1,4 +1,6 @@
 // The host, its factories and the network information object.
+#include "backend/host.h"
+#include "backend/netstacks.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -57,8 +59,12 @@ NetworkInfoImpl::~NetworkInfoImpl() = default;
 
 std::uint32_t NetworkInfoImpl::GetNetstackInstanceState(const std::string& key) {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetNetstackInstanceState", key);
-    const auto* netstack = Lib::Read<Model::NetstacksSection>().Find(key);
-    if (netstack) return netstack->state;
+    if (auto* host = Lib::RealHost()) {
+        if (auto entry = host->GetNetstacks().Find(key))
+            return entry->enabled ? Model::kNetstackEnabled : Model::kNetstackConfigured;
+    } else if (const auto* netstack = Lib::Read<Model::NetstacksSection>().Find(key)) {
+        return netstack->state;
+    }
     // The dedicated netstacks are known to the host before their first interface creates them.
     if (key == "glidex" || key == "faultTolerance" || key == "PellixProvisioning")
         return Model::kNetstackConfigured;

@@ -1,5 +1,7 @@
 // Global IP settings and connections.
 #include "hostctl/network/ip.h"
+#include "backend/host.h"
+#include "backend/netstacks.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -16,6 +18,14 @@ namespace {
 // The sockets of one class on a netstack; IPv6 sockets exist only while IPv6 is on.
 void Connections(std::uint32_t protocol, std::vector<HostCtl::Network::TcpIpConnection>& out,
                  const std::string& netstack) {
+    if (auto* host = Lib::RealHost()) {
+        static constexpr Backend::ConnectionClass kClasses[] = {
+            Backend::ConnectionClass::kTcp, Backend::ConnectionClass::kUdp, Backend::ConnectionClass::kIp};
+        auto connections = host->GetNetstacks().Connections(netstack, kClasses[protocol]);
+        out.insert(out.end(), std::make_move_iterator(connections.begin()),
+                   std::make_move_iterator(connections.end()));
+        return;
+    }
     if (!Lib::Read<Model::NetstacksSection>().Find(netstack))
         throw HostCtl::Lib::HostCtlException("Netstack instance " + Lib::Quote(netstack) + " does not exist");
     const auto* stack = Lib::Read<Model::ConnectionsSection>().Find(netstack);
@@ -33,11 +43,13 @@ void Connections(std::uint32_t protocol, std::vector<HostCtl::Network::TcpIpConn
 
 bool NetworkInfoImpl::IsTknIpv6Enabled() {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::IsTknIpv6Enabled");
+    if (auto* host = Lib::RealHost()) return host->GetNetstacks().IsIpv6Enabled();
     return Lib::Read<Model::IpSettingsSection>().ipv6Enabled;
 }
 
 void NetworkInfoImpl::SetTknIpv6Enabled(bool enabled) {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::SetTknIpv6Enabled", {}, Lib::Args(enabled));
+    if (auto* host = Lib::RealHost()) return host->GetNetstacks().SetIpv6EnabledEverywhere(enabled);
     if (Lib::Read<Model::IpSettingsSection>().ipv6Enabled != enabled)
         Lib::Write<Model::IpSettingsSection>().ipv6Enabled = enabled;
 }

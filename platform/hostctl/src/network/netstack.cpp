@@ -5,6 +5,8 @@
 #include <cctype>
 #include <iterator>
 
+#include "backend/host.h"
+#include "backend/netstacks.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -104,6 +106,18 @@ void DropStackEntry(const std::string& key) {
         stacks.end());
 }
 
+// The netstacks of the real host the session manages, or nullptr on the simulated host.
+Backend::Netstacks* RealNetstacks() {
+    auto* host = Lib::RealHost();
+    return host ? &host->GetNetstacks() : nullptr;
+}
+
+Backend::NetstackEntry RealNetstack(Backend::Netstacks& netstacks, const std::string& key) {
+    auto entry = netstacks.Find(key);
+    if (!entry) NoSuchNetstack(key);
+    return *entry;
+}
+
 }  // namespace
 
 // ---------------------------------------------------------------- NetstackInstanceImpl
@@ -159,6 +173,10 @@ std::string NetstackInstanceImpl::GetName() const {
         Enter("GetName", key_);
         return pending_->name;
     }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetName", key_);
+        return RealNetstack(*real, key_).name;
+    }
     return EnterNetstack("GetName", key_).name;
 }
 
@@ -168,6 +186,12 @@ void NetstackInstanceImpl::SetName(std::string name, bool persist) {
         CheckName(name);
         pending_->name = std::move(name);
         return;
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("SetName", key_, Lib::Args(name, persist));
+        RealNetstack(*real, key_);
+        CheckName(name);
+        return real->SetName(key_, name);
     }
     auto& netstack = EnterNetstackForWrite("SetName", key_, Lib::Args(name, persist));
     CheckName(name);
@@ -179,6 +203,10 @@ std::uint32_t NetstackInstanceImpl::GetMaxConnections() const {
         Enter("GetMaxConnections", key_);
         return static_cast<std::uint32_t>(pending_->maxConnections);
     }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetMaxConnections", key_);
+        return real->ReadSettings(key_).maxConnections;
+    }
     return EnterNetstack("GetMaxConnections", key_).maxConnections;
 }
 
@@ -188,6 +216,12 @@ void NetstackInstanceImpl::SetMaxConnections(const std::int64_t& maxConnections,
         CheckMaxConnections(maxConnections);
         pending_->maxConnections = maxConnections;
         return;
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("SetMaxConnections", key_, Lib::Args(maxConnections, persist));
+        RealNetstack(*real, key_);
+        CheckMaxConnections(maxConnections);
+        return real->SetMaxConnections(key_, static_cast<std::uint32_t>(maxConnections));
     }
     const auto& current = EnterNetstack("SetMaxConnections", key_, Lib::Args(maxConnections, persist));
     CheckMaxConnections(maxConnections);
@@ -202,6 +236,10 @@ std::string NetstackInstanceImpl::GetCongestionControlAlgorithm() const {
         Enter("GetCongestionControlAlgorithm", key_);
         return pending_->algorithm;
     }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetCongestionControlAlgorithm", key_);
+        return real->ReadSettings(key_).congestionControl;
+    }
     return EnterNetstack("GetCongestionControlAlgorithm", key_).congestionControl;
 }
 
@@ -211,6 +249,12 @@ void NetstackInstanceImpl::SetCongestionControlAlgorithm(std::string algorithm, 
         CheckAlgorithm(algorithm);
         pending_->algorithm = std::move(algorithm);
         return;
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("SetCongestionControlAlgorithm", key_, Lib::Args(algorithm, persist));
+        RealNetstack(*real, key_);
+        CheckAlgorithm(algorithm);
+        return real->SetCongestionControl(key_, algorithm);
     }
     auto& netstack =
         EnterNetstackForWrite("SetCongestionControlAlgorithm", key_, Lib::Args(algorithm, persist));
@@ -223,6 +267,10 @@ bool NetstackInstanceImpl::GetCurrentIpv6Enabled() const {
         Enter("GetCurrentIpv6Enabled", key_);
         return false;
     }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetCurrentIpv6Enabled", key_);
+        return real->ReadSettings(key_).currentIpv6Enabled;
+    }
     return EnterNetstack("GetCurrentIpv6Enabled", key_).currentIpv6Enabled;
 }
 
@@ -231,6 +279,11 @@ void NetstackInstanceImpl::SetIpv6Enabled(bool enabled, bool persist) {
         Enter("SetIpv6Enabled", key_, Lib::Args(enabled, persist));
         pending_->ipv6Enabled = enabled;
         return;
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("SetIpv6Enabled", key_, Lib::Args(enabled, persist));
+        RealNetstack(*real, key_);
+        return real->SetIpv6Enabled(key_, enabled);
     }
     const auto& current = EnterNetstack("SetIpv6Enabled", key_, Lib::Args(enabled, persist));
     if (current.ipv6Enabled != enabled)
@@ -242,6 +295,10 @@ bool NetstackInstanceImpl::GetIpv6Enabled() const {
         Enter("GetIpv6Enabled", key_);
         return pending_->ipv6Enabled;
     }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetIpv6Enabled", key_);
+        return real->ReadSettings(key_).ipv6Enabled;
+    }
     return EnterNetstack("GetIpv6Enabled", key_).ipv6Enabled;
 }
 
@@ -249,6 +306,10 @@ std::uint32_t NetstackInstanceImpl::GetState() const {
     if (pending_) {
         Enter("GetState", key_);
         return Model::kNetstackConfigured;
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetState", key_);
+        return RealNetstack(*real, key_).enabled ? Model::kNetstackEnabled : Model::kNetstackConfigured;
     }
     return EnterNetstack("GetState", key_).state;
 }
@@ -258,6 +319,10 @@ std::uint32_t NetstackInstanceImpl::GetCurrentMaxConnections() const {
         Enter("GetCurrentMaxConnections", key_);
         return 0;
     }
+    if (auto* real = RealNetstacks()) {
+        Enter("GetCurrentMaxConnections", key_);
+        return real->ReadSettings(key_).currentMaxConnections;
+    }
     return EnterNetstack("GetCurrentMaxConnections", key_).currentMaxConnections;
 }
 
@@ -265,6 +330,11 @@ void NetstackInstanceImpl::Enable() {
     if (pending_) {
         Enter("Enable", key_);
         throw HostCtlException("Netstack instance " + Quoted(key_) + " has not been added yet");
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("Enable", key_);
+        RealNetstack(*real, key_);
+        return real->Enable(key_);
     }
     const auto& current = EnterNetstack("Enable", key_);
     if (current.state == Model::kNetstackEnabled) return;
@@ -278,6 +348,13 @@ void NetstackInstanceImpl::Disable() {
     if (pending_) {
         Enter("Disable", key_);
         throw HostCtlException("Netstack instance " + Quoted(key_) + " has not been added yet");
+    }
+    if (auto* real = RealNetstacks()) {
+        Enter("Disable", key_);
+        RealNetstack(*real, key_);
+        if (key_ == kDefaultNetstack)
+            throw HostCtlException("The default netstack instance " + Quoted(key_) + " cannot be disabled");
+        return real->Disable(key_);
     }
     const auto& current = EnterNetstack("Disable", key_);
     if (key_ == kDefaultNetstack) {
@@ -313,6 +390,16 @@ void NetworkInfoImpl::AddNetstackInstance(HostCtl::Network::NetstackInstance* in
     CheckName(pending.name);
     CheckMaxConnections(pending.maxConnections);
     CheckAlgorithm(pending.algorithm);
+    if (auto* real = RealNetstacks()) {
+        if (real->Find(key)) throw HostCtlException("Netstack instance " + Quoted(key) + " already exists");
+        Backend::NetstackSettings settings;
+        settings.maxConnections = static_cast<std::uint32_t>(pending.maxConnections);
+        settings.congestionControl = pending.algorithm;
+        settings.ipv6Enabled = pending.ipv6Enabled;
+        real->Add(key, pending.name, settings, disabled);
+        impl->pending_.reset();
+        return;
+    }
     if (Lib::Read<Model::NetstacksSection>().Find(key))
         throw HostCtlException("Netstack instance " + Quoted(key) + " already exists");
 
@@ -339,6 +426,11 @@ void NetworkInfoImpl::AddNetstackInstance(HostCtl::Network::NetstackInstance* in
 std::vector<std::unique_ptr<HostCtl::Network::NetstackInstance>> NetworkInfoImpl::ListNetstackInstances() {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::ListNetstackInstances");
     std::vector<std::unique_ptr<HostCtl::Network::NetstackInstance>> list;
+    if (auto* real = RealNetstacks()) {
+        for (const auto& entry : real->List())
+            list.push_back(std::unique_ptr<NetstackInstanceImpl>(new NetstackInstanceImpl(entry.key)));
+        return list;
+    }
     for (const auto& netstack : Lib::Read<Model::NetstacksSection>().netstacks)
         list.push_back(std::unique_ptr<NetstackInstanceImpl>(new NetstackInstanceImpl(netstack.key)));
     return list;
@@ -347,6 +439,10 @@ std::vector<std::unique_ptr<HostCtl::Network::NetstackInstance>> NetworkInfoImpl
 std::unique_ptr<HostCtl::Network::NetstackInstance> NetworkInfoImpl::LookupNetstackInstanceByKey(
     const std::string& key) {
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::LookupNetstackInstanceByKey", key);
+    if (auto* real = RealNetstacks()) {
+        if (!real->Find(key)) return nullptr;
+        return std::unique_ptr<NetstackInstanceImpl>(new NetstackInstanceImpl(key));
+    }
     if (!Lib::Read<Model::NetstacksSection>().Find(key)) return nullptr;
     return std::unique_ptr<NetstackInstanceImpl>(new NetstackInstanceImpl(key));
 }
@@ -354,6 +450,12 @@ std::unique_ptr<HostCtl::Network::NetstackInstance> NetworkInfoImpl::LookupNetst
 void NetworkInfoImpl::RemoveNetstackInstance(const std::string& key, bool force) {
     // force: accepted; the same rules hold either way.
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::RemoveNetstackInstance", key, Lib::Args(force));
+    if (auto* real = RealNetstacks()) {
+        RealNetstack(*real, key);
+        if (key == kDefaultNetstack)
+            throw HostCtlException("The default netstack instance " + Quoted(key) + " cannot be removed");
+        return real->Remove(key, force);
+    }
     if (!Lib::Read<Model::NetstacksSection>().Find(key)) NoSuchNetstack(key);
     if (key == kDefaultNetstack)
         throw HostCtlException("The default netstack instance " + Quoted(key) + " cannot be removed");

@@ -1,4 +1,6 @@
 // Worlds.
+#include "backend/host.h"
+#include "backend/netstacks.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -12,6 +14,8 @@ WorldImpl::~WorldImpl() = default;
 
 std::string WorldImpl::GetWorldName() const {
     Lib::Enter("TknCtl::Resource::WorldImpl::GetWorldName", std::to_string(worldId_));
+    // A world of a real host is a process: its ID is the PID.
+    if (auto* host = Lib::RealHost()) return host->GetNetstacks().WorldName(worldId_);
     const auto* world = Lib::Read<Model::WorldsSection>().Find(worldId_);
     if (!world) throw HostCtl::Lib::HostCtlException("World " + std::to_string(worldId_) + " does not exist");
     return world->name;

@@ -182,6 +182,12 @@ TEST_F(ConnectionsTest, OwnersAUserMayNotSeeAreNone) {
         EXPECT_EQ(r["World ID"], 0) << r;
         EXPECT_EQ(r["World Name"], "") << r;
     }
+    // Another netstack's sockets need its namespace, which only root may enter.
+    Sh("ip netns add blue");
+    auto blue = HadroUnprivileged("network ip connection list -N blue");
+    EXPECT_EQ(blue.status, 1);
+    EXPECT_EQ(blue.err.rfind("Unable to get connection list.\ncannot enter network namespace blue", 0), 0u)
+        << blue.err;
 }
 
 }  // namespace

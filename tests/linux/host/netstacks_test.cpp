@@ -199,6 +199,42 @@ TEST_F(NetstacksTest, FilesOfTheAdministratorInEtcNetnsAreKept) {
     EXPECT_EQ(Slurp("/etc/netns/blue/hosts"), "127.0.0.1 db\n");
 }
 
+TEST_F(NetstacksTest, ANamespaceThatCannotTakeItsSettingsIsNotLeftBehind) {
+    std::ofstream(document_)
+        << R"({"version": 1, "netstacks": {"ft": {"disabled": true, "maxConnections": 500,
+        "congestionControl": "nosuchalgo", "ipv6Enabled": true}}})";
+    auto refused = Hadro("network ip netstack set -N ft -e true");
+    EXPECT_EQ(refused.status, 1);
+    EXPECT_NE(
+        refused.err.find("Error setting configuration for the netstack instance ft. Error was : "
+                         "Congestion-control algorithm 'nosuchalgo' is not available in the kernel, which "
+                         "offers newreno"),
+        std::string::npos)
+        << refused.err;
+    EXPECT_EQ(Namespaces(), "");
+    EXPECT_EQ(Get("ft")["State"], 0);
+    EXPECT_EQ(Get("ft")["Max Connections"], 500);
+}
+
+TEST_F(NetstacksTest, WhatTheFilesystemRefusesIsSaid) {
+    // No /etc/netns/NAME: the netstack is made all the same, and the user told.
+    Sh("touch /etc/netns");
+    auto added = Hadro("network ip netstack add -N blue");
+    EXPECT_EQ(added.status, 0);
+    EXPECT_EQ(
+        added.err,
+        "Warning: cannot make /etc/netns/blue: the netstack has no files of its own for `ip netns exec`\n");
+    EXPECT_EQ(Namespaces(), "blue ");
+    EXPECT_EQ(Hadro("network ip netstack remove -N blue").All(), "");
+
+    // No directory for namespaces at all: refused, nothing made.
+    Sh("umount /run/netns && rmdir /run/netns && touch /run/netns");
+    ExpectRefused(
+        "network ip netstack add -N glidex",
+        "Unable to add Netstack Instance. Error was : cannot make /run/netns/glidex: Not a directory");
+    EXPECT_EQ(HadroJson("network ip netstack list").size(), 1u);
+}
+
 TEST_F(NetstacksTest, ReadsNeedNoPrivilegeAndChangesNeedRoot) {
     Sh("ip netns add blue");
     EXPECT_EQ(Hadro("network ip netstack add -N ft -d").status, 0);

@@ -51,6 +51,8 @@ TEST(NetstackRecords, DamagedMembersAreRefusedSayingWhy) {
     const std::pair<const char*, const char*> damaged[] = {
         {R"([1])", "not an object"},
         {R"({"a": 1})", "'a': not an object"},
+        {R"({"a/b": {}})", "'a/b': no name a namespace can have"},
+        {R"({"..": {}})", "'..': no name a namespace can have"},
         {R"({"a": {"name": 7}})", "'a': member 'name' is unknown or of the wrong type"},
         {R"({"a": {"colour": "red"}})", "'a': member 'colour' is unknown"},
         {R"({"a": {"disabled": "yes"}})", "member 'disabled'"},

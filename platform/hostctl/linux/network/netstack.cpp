@@ -51,6 +51,7 @@ NetstackRecords ParseNetstackRecords(const json& member) {
         auto fault = [&](const std::string& what) {
             return std::invalid_argument(Lib::Quote(key) + ": " + what);
         };
+        if (!Kernel::IsNamespaceName(key)) throw fault("no name a namespace can have");
         if (!value.is_object()) throw fault("not an object");
         NetstackRecord record;
         for (const auto& [field, item] : value.items()) {

@@ -145,10 +145,6 @@ TEST_F(ConnectionsTest, ListsTheSocketsOfEachClassWithTheirOwnersAsSsDoes) {
         }
     }
     EXPECT_TRUE(sawListener);
-    auto table = Hadro("network ip connection list -t tcp");
-    EXPECT_NE(table.out.find("[::1]:8443"), std::string::npos) << table.out;
-    EXPECT_NE(table.out.find("ESTABLISHED"), std::string::npos) << table.out;
-    EXPECT_EQ(table.out.find("udp"), std::string::npos) << table.out;
 
     auto raw = HadroJson("network ip connection list -t ip");
     ASSERT_EQ(raw.size(), 2u);

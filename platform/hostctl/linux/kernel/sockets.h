@@ -48,6 +48,8 @@ struct InetSocket {
     std::uint32_t uid = 0;
     std::uint64_t inode = 0;        // 0 when no file holds it (a TIME_WAIT socket, a request)
     std::string congestionControl;  // TCP: the algorithm as the kernel names it ("reno"); else empty
+
+    bool operator==(const InetSocket&) const = default;
 };
 
 // The request that dumps every socket of a kind and an address family, in every state,

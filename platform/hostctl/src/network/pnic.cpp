@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <limits>
 
+#include "backend/nics.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -27,6 +28,15 @@ const Model::Pnic& Enter(const char* operation, const std::string& name, const s
     return Model::ReadPnic(name);
 }
 
+// The real host's NICs, when the session manages one.
+Backend::Nics* Real(const char* operation, const std::string& name) {
+    return Backend::EnterRealNics(std::string("HostCtl::Network::Pnic::") + operation, name);
+}
+
+Net::MacAddress MacOf(const std::string& text) {
+    return Net::MacAddress::IsWellFormed(text) ? Net::MacAddress(text) : Net::MacAddress();
+}
+
 const char* PortText(std::uint32_t port) {
     static const char* const kNames[] = {"TP", "AUI", "BNC", "MII", "FIBRE", "DA"};
     return port < std::size(kNames) ? kNames[port] : "UNKNOWN";
@@ -50,6 +60,8 @@ PnicImpl::PnicImpl(std::string name) : name_(std::move(name)) {}
 PnicImpl::~PnicImpl() = default;
 
 bool PnicImpl::IsValidPnic(const std::string& name) {
+    if (auto* nics = Backend::EnterRealNics("TknCtl::Network::PnicImpl::IsValidPnic", name))
+        return nics->Has(name);
     Lib::Enter("TknCtl::Network::PnicImpl::IsValidPnic", name);
     return Lib::Read<Model::PnicsSection>().Find(name) != nullptr;
 }
@@ -64,14 +76,21 @@ std::unique_ptr<HostCtl::Network::Port> PnicImpl::GetPort() const {
 }
 
 std::vector<std::unique_ptr<HostCtl::Network::Pnic>> NetworkInfoImpl::GetPnics() {
-    Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetPnics");
     std::vector<std::unique_ptr<HostCtl::Network::Pnic>> nics;
+    if (auto* real = Backend::EnterRealNics("TknCtl::Network::NetworkInfoImpl::GetPnics")) {
+        for (auto& name : real->List())
+            nics.push_back(std::make_unique<PnicImpl>(std::move(name)));
+        return nics;
+    }
+    Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetPnics");
     for (const auto& nic : Lib::Read<Model::PnicsSection>().nics)
         nics.push_back(std::make_unique<PnicImpl>(nic.name));
     return nics;
 }
 
 std::unique_ptr<HostCtl::Network::Pnic> NetworkInfoImpl::GetPnicByName(const std::string& name) {
+    if (auto* nics = Backend::EnterRealNics("TknCtl::Network::NetworkInfoImpl::GetPnicByName", name))
+        return nics->Has(name) ? std::make_unique<PnicImpl>(name) : nullptr;
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetPnicByName", name);
     if (!Lib::Read<Model::PnicsSection>().Find(name)) return nullptr;
     return std::make_unique<PnicImpl>(name);
@@ -85,51 +104,66 @@ std::string PnicImpl::GetName() const {
 }
 
 std::unique_ptr<Net::PciDevice> PnicImpl::GetPciDevice() const {
+    if (auto* nics = Real("GetPciDevice", name_)) return nics->GetPciDevice(name_);
     const auto& nic = Enter("GetPciDevice", name_);
     if (!nic.pci) return nullptr;
     return std::make_unique<Net::PciDevice>(nic.pci->address, nic.pci->vendor, nic.pci->device);
 }
 
 std::string PnicImpl::GetDeviceDescription() const {
+    if (auto* nics = Real("GetDeviceDescription", name_)) return nics->GetDeviceDescription(name_);
     return Enter("GetDeviceDescription", name_).description;
 }
 
 std::string PnicImpl::GetDriverName() const {
+    if (auto* nics = Real("GetDriverName", name_)) {
+        Net::PnicDriverInfo info;
+        nics->GetDriverInfo(name_, info);
+        return info.driver;
+    }
     return Enter("GetDriverName", name_).driver.name;
 }
 
 bool PnicImpl::IsLinkUp() const {
+    if (auto* nics = Real("IsLinkUp", name_)) return nics->GetLink(name_).linkUp;
     return Enter("IsLinkUp", name_).linkUp;
 }
 
 bool PnicImpl::IsLinkStatusUp() const {
+    if (auto* nics = Real("IsLinkStatusUp", name_)) return nics->GetLink(name_).linkStatusUp;
     const auto& nic = Enter("IsLinkStatusUp", name_);
     return nic.adminUp && nic.linkUp;
 }
 
 bool PnicImpl::IsAdminUp() const {
+    if (auto* nics = Real("IsAdminUp", name_)) return nics->GetLink(name_).adminUp;
     return Enter("IsAdminUp", name_).adminUp;
 }
 
 std::uint32_t PnicImpl::GetLinkSpeed() const {
+    if (auto* nics = Real("GetLinkSpeed", name_)) return nics->GetLink(name_).speed;
     const auto& nic = Enter("GetLinkSpeed", name_);
     return nic.linkUp ? nic.speed : 0;
 }
 
 std::uint32_t PnicImpl::GetDuplex() const {
+    if (auto* nics = Real("GetDuplex", name_)) return nics->GetLink(name_).duplex;
     const auto& nic = Enter("GetDuplex", name_);
     return nic.linkUp ? nic.duplex : Net::PNIC_DUPLEX_HALF;
 }
 
 Net::MacAddress PnicImpl::GetMacAddress() const {
+    if (auto* nics = Real("GetMacAddress", name_)) return MacOf(nics->GetLink(name_).mac);
     return Enter("GetMacAddress", name_).mac;
 }
 
 std::uint32_t PnicImpl::GetMtu() const {
+    if (auto* nics = Real("GetMtu", name_)) return nics->GetLink(name_).mtu;
     return Enter("GetMtu", name_).mtu;
 }
 
 void PnicImpl::GetDriverInfo(Net::PnicDriverInfo& info) const {
+    if (auto* nics = Real("GetDriverInfo", name_)) return nics->GetDriverInfo(name_, info);
     const auto& driver = Enter("GetDriverInfo", name_).driver;
     info.driver = driver.name;
     info.version = driver.version;
@@ -138,6 +172,7 @@ void PnicImpl::GetDriverInfo(Net::PnicDriverInfo& info) const {
 }
 
 void PnicImpl::SetAdminUp(bool up) {
+    if (auto* nics = Real("SetAdminUp", name_)) return nics->SetAdminUp(name_, up);
     Enter("SetAdminUp", name_, Lib::Args(up));
     auto& nic = Model::WritePnic(name_);
     nic.adminUp = up;
@@ -146,6 +181,7 @@ void PnicImpl::SetAdminUp(bool up) {
 }
 
 void PnicImpl::SetSpeedDuplex(std::uint32_t speed, std::uint32_t duplex) {
+    if (auto* nics = Real("SetSpeedDuplex", name_)) return nics->SetSpeedDuplex(name_, speed, duplex);
     const auto& current = Enter("SetSpeedDuplex", name_, Lib::Args(speed, duplex));
     if (speed == 0 && duplex == Net::PNIC_DUPLEX_AUTO) {
         if (!current.settings.supportsAutoNegotiation)
@@ -182,6 +218,7 @@ void PnicImpl::SetSpeedDuplex(std::uint32_t speed, std::uint32_t duplex) {
 // ---------------------------------------------------------------- general settings
 
 void PnicImpl::GetPnicInfo(Net::PnicInfo& info) const {
+    if (auto* nics = Real("GetPnicInfo", name_)) return nics->GetPnicInfo(name_, info);
     const auto& nic = Enter("GetPnicInfo", name_);
     const auto& s = nic.settings;
     info = Net::PnicInfo();
@@ -226,6 +263,7 @@ std::string ChangedAttributes(const Net::PnicInfo& info) {
 }  // namespace
 
 void PnicImpl::SetPnicInfo(const Net::PnicInfo& info) {
+    if (auto* nics = Real("SetPnicInfo", name_)) return nics->SetPnicInfo(name_, info);
     const auto& current = Enter("SetPnicInfo", name_, ChangedAttributes(info));
     const auto& s = current.settings;
     // Check the whole request before anything changes.

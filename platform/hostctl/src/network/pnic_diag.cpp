@@ -9,6 +9,7 @@
 #include <cstdio>
 #include <cstring>
 
+#include "backend/nics.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -25,6 +26,11 @@ namespace {
 const Model::Pnic& Enter(const char* operation, const std::string& name, const std::string& arguments = {}) {
     Lib::Enter(std::string("HostCtl::Network::Pnic::") + operation, name, arguments);
     return Model::ReadPnic(name);
+}
+
+// The real host's NICs, when the session manages one.
+Backend::Nics* Real(const char* operation, const std::string& name) {
+    return Backend::EnterRealNics(std::string("HostCtl::Network::Pnic::") + operation, name);
 }
 
 void Require(const Model::Pnic& nic, const char* feature, const char* what) {
@@ -100,6 +106,8 @@ std::vector<std::uint8_t> ReadBoundedFile(const std::string& path, std::size_t l
 // ---------------------------------------------------------------- counters
 
 void PnicImpl::GetPnicStats(Net::PnicStats& stats) const {
+    if (auto* nics = Backend::EnterRealNics("TknCtl::Network::PnicImpl::GetPnicStats", name_))
+        return nics->GetStats(name_, stats);
     Lib::Enter("TknCtl::Network::PnicImpl::GetPnicStats", name_);
     const auto& s = Model::ReadPnic(name_).stats;
     stats.rxPackets = s.rxPackets;
@@ -130,6 +138,7 @@ void PnicImpl::GetPnicStats(Net::PnicStats& stats) const {
 // ---------------------------------------------------------------- registers and EEPROM
 
 void PnicImpl::GetRegisterDump(std::vector<std::uint8_t>& bytes) const {
+    if (auto* nics = Real("GetRegisterDump", name_)) return nics->GetRegisterDump(name_, bytes);
     const auto& nic = Enter("GetRegisterDump", name_);
     Require(nic, "registers", "register dumps");
     bytes = nic.registers;
@@ -137,6 +146,7 @@ void PnicImpl::GetRegisterDump(std::vector<std::uint8_t>& bytes) const {
 
 void PnicImpl::GetEepromDump(std::vector<std::uint8_t>& bytes, std::int64_t length,
                              std::int64_t offset) const {
+    if (auto* nics = Real("GetEepromDump", name_)) return nics->GetEepromDump(name_, bytes, length, offset);
     const auto& nic =
         Enter("GetEepromDump", name_,
               Lib::Args("offset=" + std::to_string(offset), "length=" + std::to_string(length)));
@@ -152,6 +162,20 @@ void PnicImpl::GetEepromDump(std::vector<std::uint8_t>& bytes, std::int64_t leng
 }
 
 void PnicImpl::SetEepromValue(std::int64_t magic, std::int64_t offset, std::int64_t value) {
+    if (auto* nics = Real("SetEepromValue", name_)) {
+        const std::uint32_t size = nics->BeginEepromWrite(name_);
+        if (offset < 0 || offset > static_cast<std::int64_t>(size) - 4) {
+            throw HostCtlException("Offset " + std::to_string(offset) + " is outside the EEPROM of " + name_ +
+                                   " (" + std::to_string(size) + " bytes): a double word needs 4 bytes");
+        }
+        if (value < 0 || value > 0xffffffffLL)
+            throw HostCtlException("EEPROM value " + std::to_string(value) +
+                                   " does not fit in a double word");
+        std::vector<std::uint8_t> word(4);
+        for (int i = 0; i < 4; ++i)
+            word[static_cast<std::size_t>(i)] = static_cast<std::uint8_t>((value >> (8 * i)) & 0xff);
+        return nics->WriteEeprom(name_, magic, offset, word);
+    }
     const auto& nic =
         Enter("SetEepromValue", name_, Lib::Args("offset=" + std::to_string(offset), "value=" + Hex(value)));
     Require(nic, "eeprom", "EEPROM access");
@@ -169,6 +193,13 @@ void PnicImpl::SetEepromValue(std::int64_t magic, std::int64_t offset, std::int6
 }
 
 void PnicImpl::SetEepromFromFile(std::int64_t magic, const std::string& file) {
+    if (auto* nics = Real("SetEepromFromFile", name_)) {
+        const std::uint32_t size = nics->BeginEepromWrite(name_);
+        const auto content =
+            ReadBoundedFile(file, size, "the EEPROM of " + name_ + " (" + std::to_string(size) + " bytes)");
+        if (content.empty()) throw HostCtlException("EEPROM file " + file + " is empty");
+        return nics->WriteEeprom(name_, magic, 0, content);
+    }
     const auto& nic = Enter("SetEepromFromFile", name_, file);
     Require(nic, "eeprom", "EEPROM access");
     RequireMagic(nic, magic);
@@ -181,6 +212,7 @@ void PnicImpl::SetEepromFromFile(std::int64_t magic, const std::string& file) {
 // ---------------------------------------------------------------- self test and negotiation
 
 void PnicImpl::RunSelfTest(Net::PnicSelfTestResult& result, bool online) {
+    if (auto* nics = Real("RunSelfTest", name_)) return nics->RunSelfTest(name_, result, online);
     const auto& nic = Enter("RunSelfTest", name_, online ? "online" : "offline");
     Require(nic, "selfTest", "self tests");
     const auto& report = online ? nic.selfTest.online : nic.selfTest.offline;
@@ -200,6 +232,7 @@ void PnicImpl::RunSelfTest(Net::PnicSelfTestResult& result, bool online) {
 }
 
 void PnicImpl::RestartNegotiation() {
+    if (auto* nics = Real("RestartNegotiation", name_)) return nics->RestartNegotiation(name_);
     const auto& nic = Enter("RestartNegotiation", name_);
     if (!nic.settings.autoNegotiation) {
         throw HostCtlException("Auto-negotiation is off on " + name_ +

@@ -1,6 +1,7 @@
 // Physical NICs: netqueue load balancer, queue counts, filter classes and plugins.
 #include <algorithm>
 
+#include "backend/nics.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -20,6 +21,11 @@ const Model::Pnic& Enter(const char* operation, const std::string& name, const s
     if (!Model::Supports(nic, "netqueue"))
         throw HostCtlException(name + " does not support netqueue (driver " + nic.driver.name + ")");
     return nic;
+}
+
+// The real host's NICs, when the session manages one.
+Backend::Nics* Real(const char* operation, const std::string& name) {
+    return Backend::EnterRealNics(std::string("HostCtl::Network::Pnic::") + operation, name);
 }
 
 // Features the device itself has no say in: the load balancer may always allow them.
@@ -61,6 +67,7 @@ std::string Arguments(const Net::PnicNetqueueInfo& info) {
 }  // namespace
 
 void PnicImpl::GetNetqueueInfo(Net::PnicNetqueueInfo& info) const {
+    if (auto* nics = Real("GetNetqueueInfo", name_)) return nics->GetNetqueueInfo(name_, info);
     const auto& q = Enter("GetNetqueueInfo", name_).netqueue;
     info = Net::PnicNetqueueInfo();
     info.txQueueCount = q.txQueues;
@@ -83,6 +90,7 @@ void PnicImpl::GetNetqueueInfo(Net::PnicNetqueueInfo& info) const {
 }
 
 void PnicImpl::SetNetqueueInfo(const Net::PnicNetqueueInfo& info) {
+    if (auto* nics = Real("SetNetqueueInfo", name_)) return nics->SetNetqueueInfo(name_, info);
     const auto& q = Enter("SetNetqueueInfo", name_, Arguments(info)).netqueue;
     // Check the whole request before anything changes.
     if (info.lbMask & ~((1u << Model::kLbFeatureCount) - 1)) {

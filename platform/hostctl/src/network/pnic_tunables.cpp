@@ -3,6 +3,7 @@
 #include <array>
 #include <cstdio>
 
+#include "backend/nics.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -19,6 +20,11 @@ namespace {
 const Model::Pnic& Enter(const char* operation, const std::string& name, const std::string& arguments = {}) {
     Lib::Enter(std::string("HostCtl::Network::Pnic::") + operation, name, arguments);
     return Model::ReadPnic(name);
+}
+
+// The real host's NICs, when the session manages one.
+Backend::Nics* Real(const char* operation, const std::string& name) {
+    return Backend::EnterRealNics(std::string("HostCtl::Network::Pnic::") + operation, name);
 }
 
 // Fails when the adapter's driver lacks a feature; what names it for the message.
@@ -43,6 +49,7 @@ void RequireMask(std::uint32_t mask, std::uint32_t known, const char* what) {
 // ---------------------------------------------------------------- pause
 
 void PnicImpl::GetPauseParams(Net::PnicPauseParams& pause) const {
+    if (auto* nics = Real("GetPauseParams", name_)) return nics->GetPauseParams(name_, pause);
     const auto& p = Enter("GetPauseParams", name_).pause;
     pause.supported = p.supported;
     pause.autoNegotiate = p.autoNegotiate;
@@ -53,6 +60,7 @@ void PnicImpl::GetPauseParams(Net::PnicPauseParams& pause) const {
 }
 
 void PnicImpl::SetPauseParams(const Net::PnicPauseParams& pause) {
+    if (auto* nics = Real("SetPauseParams", name_)) return nics->SetPauseParams(name_, pause);
     const auto& nic = Enter("SetPauseParams", name_,
                             "autoneg=" + Lib::Args(pause.autoNegotiate) + " rx=" + Lib::Args(pause.rx) +
                                 " tx=" + Lib::Args(pause.tx));
@@ -71,6 +79,7 @@ void PnicImpl::SetPauseParams(const Net::PnicPauseParams& pause) {
 // ---------------------------------------------------------------- coalescing
 
 void PnicImpl::GetCoalesceParams(Net::PnicCoalesceParams& params) const {
+    if (auto* nics = Real("GetCoalesceParams", name_)) return nics->GetCoalesceParams(name_, params);
     const auto& nic = Enter("GetCoalesceParams", name_);
     Require(nic, "coalesce", "interrupt coalescing");
     const auto& c = nic.coalesce;
@@ -99,6 +108,7 @@ void PnicImpl::GetCoalesceParams(Net::PnicCoalesceParams& params) const {
 }
 
 void PnicImpl::SetCoalesceParams(const Net::PnicCoalesceParams& p) {
+    if (auto* nics = Real("SetCoalesceParams", name_)) return nics->SetCoalesceParams(name_, p);
     const auto& nic =
         Enter("SetCoalesceParams", name_,
               Lib::Args("rx=" + std::to_string(p.rxUsecs) + "/" + std::to_string(p.rxMaxFrames),
@@ -146,6 +156,7 @@ void PnicImpl::SetCoalesceParams(const Net::PnicCoalesceParams& p) {
 // ---------------------------------------------------------------- offloads
 
 void PnicImpl::GetOffloadSettings(Net::PnicOffloadSettings& settings) const {
+    if (auto* nics = Real("GetOffloadSettings", name_)) return nics->GetOffloadSettings(name_, settings);
     const auto& nic = Enter("GetOffloadSettings", name_);
     Require(nic, "offload", "offload settings");
     const auto& o = nic.offload;
@@ -159,6 +170,7 @@ void PnicImpl::GetOffloadSettings(Net::PnicOffloadSettings& settings) const {
 }
 
 void PnicImpl::SetOffloadSettings(const Net::PnicOffloadSettings& s) {
+    if (auto* nics = Real("SetOffloadSettings", name_)) return nics->SetOffloadSettings(name_, s);
     const auto& nic = Enter("SetOffloadSettings", name_,
                             Lib::Args("mask=" + Hex(s.mask), "rxcsum=" + Lib::Args(s.rxChecksum),
                                       "txcsum=" + Lib::Args(s.txChecksum), "sg=" + Lib::Args(s.scatterGather),
@@ -178,6 +190,7 @@ void PnicImpl::SetOffloadSettings(const Net::PnicOffloadSettings& s) {
 // ---------------------------------------------------------------- rings
 
 void PnicImpl::GetRingParams(Net::PnicRingParams& params) const {
+    if (auto* nics = Real("GetRingParams", name_)) return nics->GetRingParams(name_, params);
     const auto& nic = Enter("GetRingParams", name_);
     Require(nic, "ring", "ring parameters");
     const auto& r = nic.ring;
@@ -192,6 +205,7 @@ void PnicImpl::GetRingParams(Net::PnicRingParams& params) const {
 }
 
 void PnicImpl::SetRingParams(const Net::PnicRingParams& p) {
+    if (auto* nics = Real("SetRingParams", name_)) return nics->SetRingParams(name_, p);
     std::string arguments = "mask=" + Hex(p.mask);
     if (p.mask & Net::PNIC_RING_RX) arguments += " rx=" + std::to_string(p.rx);
     if (p.mask & Net::PNIC_RING_RX_MINI) arguments += " rxMini=" + std::to_string(p.rxMini);
@@ -245,6 +259,7 @@ auto SoftwareSwitches(Settings& s) {
 }  // namespace
 
 void PnicImpl::GetSoftwareSettings(Net::PnicSoftwareSettings& settings) const {
+    if (auto* nics = Real("GetSoftwareSettings", name_)) return nics->GetSoftwareSettings(name_, settings);
     const auto& nic = Enter("GetSoftwareSettings", name_);
     Require(nic, "software", "software simulation of offloads");
     auto switches = SoftwareSwitches(settings);
@@ -253,6 +268,7 @@ void PnicImpl::GetSoftwareSettings(Net::PnicSoftwareSettings& settings) const {
 }
 
 void PnicImpl::SetSoftwareSettings(const Net::PnicSoftwareSettings& settings) {
+    if (auto* nics = Real("SetSoftwareSettings", name_)) return nics->SetSoftwareSettings(name_, settings);
     auto switches = SoftwareSwitches(settings);
     std::string arguments = "mask=" + Hex(settings.mask);
     for (std::size_t i = 0; i < Model::kSoftwareFeatureCount; ++i) {

@@ -1,6 +1,7 @@
 // VLAN statistics of switch uplinks: counted per VLAN while their collection is on.
 #include <algorithm>
 
+#include "backend/nics.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
 #include "model/dvswitches.h"
@@ -32,6 +33,7 @@ const Model::Pnic& Uplink(const std::string& switchName, const std::string& upli
 
 std::vector<HostCtl::Network::VlanStats> UplinkVlanStats(const std::string& switchName,
                                                          const std::string& uplink) {
+    if (auto* host = Lib::RealHost()) return host->GetNics().GetUplinkVlanStats(switchName, uplink);
     const auto& nic = Uplink(switchName, uplink);
     std::vector<HostCtl::Network::VlanStats> stats;
     if (!nic.vlanStatsEnabled) return stats;
@@ -41,6 +43,8 @@ std::vector<HostCtl::Network::VlanStats> UplinkVlanStats(const std::string& swit
 }
 
 void SetUplinkVlanStatsEnabled(const std::string& switchName, const std::string& uplink, bool enabled) {
+    if (auto* host = Lib::RealHost())
+        return host->GetNics().SetUplinkVlanStatsEnabled(switchName, uplink, enabled);
     Uplink(switchName, uplink);
     // The VLANs the switch's port groups carry are counted from the moment collection starts
     // (4095 stands for all VLANs, not for one). Counters gathered before are kept.

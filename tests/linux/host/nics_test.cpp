@@ -244,6 +244,12 @@ TEST_F(NicsTest, TheVethDriverRefusesWhatItDoesNotHave) {
     };
     for (const auto& [arguments, message] : refusals)
         EXPECT_EQ(Refused(arguments), message + "\n") << arguments;
+    // What no NIC takes is refused before the driver is asked.
+    EXPECT_EQ(Refused("network nic set -n vmnic0 -P 40"), "PHY address 40 is out of range (0 to 31)\n");
+    EXPECT_EQ(Refused("network nic eeprom change -n vmnic0 -o 0 -v 1 -m -1"),
+              "Magic key -1 does not fit in 32 bits\n");
+    EXPECT_EQ(Refused("network nic eeprom change -n vmnic0 -o 0 -v 4294967296"),
+              "EEPROM value 4294967296 does not fit in a double word\n");
 
     // The listings show what the driver cannot say as not available, and go on.
     auto coalesce = HadroJson("network nic coalesce get")[0];

@@ -177,12 +177,9 @@ std::vector<std::string> LinuxNics::List() {
 }
 
 bool LinuxNics::Has(const std::string& name) {
-    try {
-        Require(name);
-        return true;
-    } catch (const HostCtlException&) {
-        return false;
-    }
+    if (name.empty() || name.size() >= IFNAMSIZ || name.find('/') != std::string::npos) return false;
+    const auto link = Kernel::FindLink(Own(), name);
+    return link && IsNic(*link);
 }
 
 // ---------------------------------------------------------------- identity
@@ -224,8 +221,11 @@ std::string LinuxNics::GetDeviceDescription(const std::string& name) {
     return DeviceDescription(Kernel::ReadNetDevice(sysfs_, name), link.kind);
 }
 
+// A device whose driver gives no information (the kernel finds neither the driver's own nor
+// that of a parent device) shows empty texts.
 void LinuxNics::GetDriverInfo(const std::string& name, Net::PnicDriverInfo& info) {
     Require(name);
+    info = Net::PnicDriverInfo();
     try {
         const auto driver = Kernel::ReadDriverInfo(name);
         info.driver = driver.driver;
@@ -233,7 +233,7 @@ void LinuxNics::GetDriverInfo(const std::string& name, Net::PnicDriverInfo& info
         info.firmwareVersion = driver.firmwareVersion;
         info.busInfo = driver.busInfo;
     } catch (const Kernel::EthtoolRefusal& refusal) {
-        Refuse("Cannot read the driver information of " + name, refusal);
+        if (!refusal.Unsupported()) Refuse("Cannot read the driver information of " + name, refusal);
     }
 }
 

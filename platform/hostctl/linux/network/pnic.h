@@ -57,7 +57,7 @@ public:
     void GetRegisterDump(const std::string& name, std::vector<std::uint8_t>& bytes) override;
     void GetEepromDump(const std::string& name, std::vector<std::uint8_t>& bytes, std::int64_t length,
                        std::int64_t offset) override;
-    std::uint32_t BeginEepromWrite(const std::string& name) override;
+    std::uint32_t BeginEepromWrite(const std::string& name, std::int64_t magic) override;
     void WriteEeprom(const std::string& name, std::int64_t magic, std::int64_t offset,
                      const std::vector<std::uint8_t>& bytes) override;
     void RunSelfTest(const std::string& name, HostCtl::Network::PnicSelfTestResult& result,

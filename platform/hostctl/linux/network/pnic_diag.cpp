@@ -103,8 +103,10 @@ void LinuxNics::GetEepromDump(const std::string& name, std::vector<std::uint8_t>
     }
 }
 
-std::uint32_t LinuxNics::BeginEepromWrite(const std::string& name) {
+std::uint32_t LinuxNics::BeginEepromWrite(const std::string& name, std::int64_t magic) {
     Require(name);
+    if (magic < 0 || magic > 0xffffffffLL)
+        throw HostCtlException("Magic key " + std::to_string(magic) + " does not fit in 32 bits");
     context_.BeginChange();
     try {
         const std::uint32_t size = Kernel::ReadDriverInfo(name).eepromLength;
@@ -120,9 +122,7 @@ std::uint32_t LinuxNics::BeginEepromWrite(const std::string& name) {
 
 void LinuxNics::WriteEeprom(const std::string& name, std::int64_t magic, std::int64_t offset,
                             const std::vector<std::uint8_t>& bytes) {
-    const std::uint32_t size = BeginEepromWrite(name);
-    if (magic < 0 || magic > 0xffffffffLL)
-        throw HostCtlException("Magic key " + std::to_string(magic) + " does not fit in 32 bits");
+    const std::uint32_t size = BeginEepromWrite(name, magic);
     if (offset < 0 || offset + static_cast<std::int64_t>(bytes.size()) > static_cast<std::int64_t>(size)) {
         throw HostCtlException(std::to_string(bytes.size()) + " bytes at offset " + std::to_string(offset) +
                                " do not fit in " + EepromOf(name, size));

@@ -87,9 +87,9 @@ public:
     // EEPROM; an offset outside it or a negative length is refused.
     virtual void GetEepromDump(const std::string& name, std::vector<std::uint8_t>& bytes, std::int64_t length,
                                std::int64_t offset) = 0;
-    // Before an EEPROM write: checks that the change may be made (privilege, an EEPROM the
-    // driver writes) and gives the EEPROM's size in bytes.
-    virtual std::uint32_t BeginEepromWrite(const std::string& name) = 0;
+    // Before an EEPROM write: checks that the change may be made (the magic key's range,
+    // privilege, an EEPROM the driver writes) and gives the EEPROM's size in bytes.
+    virtual std::uint32_t BeginEepromWrite(const std::string& name, std::int64_t magic) = 0;
     // Writes bytes from offset on (within the EEPROM); magic is the driver's key.
     virtual void WriteEeprom(const std::string& name, std::int64_t magic, std::int64_t offset,
                              const std::vector<std::uint8_t>& bytes) = 0;

@@ -163,14 +163,14 @@ void PnicImpl::GetEepromDump(std::vector<std::uint8_t>& bytes, std::int64_t leng
 
 void PnicImpl::SetEepromValue(std::int64_t magic, std::int64_t offset, std::int64_t value) {
     if (auto* nics = Real("SetEepromValue", name_)) {
-        const std::uint32_t size = nics->BeginEepromWrite(name_);
+        if (value < 0 || value > 0xffffffffLL)
+            throw HostCtlException("EEPROM value " + std::to_string(value) +
+                                   " does not fit in a double word");
+        const std::uint32_t size = nics->BeginEepromWrite(name_, magic);
         if (offset < 0 || offset > static_cast<std::int64_t>(size) - 4) {
             throw HostCtlException("Offset " + std::to_string(offset) + " is outside the EEPROM of " + name_ +
                                    " (" + std::to_string(size) + " bytes): a double word needs 4 bytes");
         }
-        if (value < 0 || value > 0xffffffffLL)
-            throw HostCtlException("EEPROM value " + std::to_string(value) +
-                                   " does not fit in a double word");
         std::vector<std::uint8_t> word(4);
         for (int i = 0; i < 4; ++i)
             word[static_cast<std::size_t>(i)] = static_cast<std::uint8_t>((value >> (8 * i)) & 0xff);
@@ -194,7 +194,7 @@ void PnicImpl::SetEepromValue(std::int64_t magic, std::int64_t offset, std::int6
 
 void PnicImpl::SetEepromFromFile(std::int64_t magic, const std::string& file) {
     if (auto* nics = Real("SetEepromFromFile", name_)) {
-        const std::uint32_t size = nics->BeginEepromWrite(name_);
+        const std::uint32_t size = nics->BeginEepromWrite(name_, magic);
         const auto content =
             ReadBoundedFile(file, size, "the EEPROM of " + name_ + " (" + std::to_string(size) + " bytes)");
         if (content.empty()) throw HostCtlException("EEPROM file " + file + " is empty");

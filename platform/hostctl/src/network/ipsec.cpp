@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <iterator>
 
+#include "backend/host.h"
+#include "backend/ipsec.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -161,6 +163,27 @@ void OrphanPolicies(Model::IpsecSection& ipsec, const std::string& saName) {
     }
 }
 
+// The messages of the duplicate and existence checks, shared by both hosts.
+std::string SaExists(const std::string& name) {
+    return "Security Association " + Quoted(name) + " already exists";
+}
+std::string SaNotFound(const std::string& name) {
+    return "Security Association " + Quoted(name) + " does not exist";
+}
+std::string SaSameKey(const std::string& name, const Net::IpSecSadParam& sa) {
+    return "Security Association " + Quoted(name) + " already has source " + sa.source.GetStringAddress() +
+           ", destination " + sa.destination.GetStringAddress() + " and SPI " + Hex(sa.spi);
+}
+std::string NoAutoSa(const Net::IpSecSadParam& sa) {
+    return "No automatic Security Association has source " + sa.source.GetStringAddress() + ", destination " +
+           sa.destination.GetStringAddress() + " and SPI " + Hex(sa.spi);
+}
+
+// A real host names the associations it made without a name "auto".
+bool IsNamedOnRealHost(const Net::IpSecSadParam& sa, const std::string& name) {
+    return sa.name == name && sa.name != kAutoSaName;
+}
+
 }  // namespace
 
 IpSecConfigImpl::IpSecConfigImpl() = default;
@@ -227,15 +250,20 @@ void IpSecConfigImpl::AddSADConfig(const Net::IpSecSadParam& sa) {
     }
     CheckKey(sa.integrityKey, IntegrityKeyBytes(sa.integrityAlgorithm), integrity, "integrity");
 
-    const auto& ipsec = Lib::Read<Model::IpsecSection>();
-    if (FindNamedSa(ipsec, sa.name))
-        throw HostCtlException("Security Association " + Quoted(sa.name) + " already exists");
-    for (const auto& other : ipsec.sas) {
-        if (other.source == sa.source && other.destination == sa.destination && other.spi == sa.spi) {
-            throw HostCtlException("Security Association " + Quoted(other.name) + " already has source " +
-                                   sa.source.GetStringAddress() + ", destination " +
-                                   sa.destination.GetStringAddress() + " and SPI " + Hex(sa.spi));
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetIpsec();
+        for (const auto& other : area.ListSas(false)) {
+            if (IsNamedOnRealHost(other, sa.name)) throw HostCtlException(SaExists(sa.name));
+            if (other.source == sa.source && other.destination == sa.destination && other.spi == sa.spi)
+                throw HostCtlException(SaSameKey(other.name, sa));
         }
+        return area.AddSa(sa);
+    }
+    const auto& ipsec = Lib::Read<Model::IpsecSection>();
+    if (FindNamedSa(ipsec, sa.name)) throw HostCtlException(SaExists(sa.name));
+    for (const auto& other : ipsec.sas) {
+        if (other.source == sa.source && other.destination == sa.destination && other.spi == sa.spi)
+            throw HostCtlException(SaSameKey(other.name, sa));
     }
 
     Model::IpsecSa stored;
@@ -255,6 +283,10 @@ void IpSecConfigImpl::AddSADConfig(const Net::IpSecSadParam& sa) {
 
 void IpSecConfigImpl::GetSADConfigList(std::vector<Net::IpSecSadParam>& out) const {
     Enter("GetSADConfigList");
+    if (auto* host = Lib::RealHost()) {
+        out = host->GetIpsec().ListSas(true);
+        return;
+    }
     out.clear();
     for (const auto& sa : Lib::Read<Model::IpsecSection>().sas) {
         Net::IpSecSadParam param;
@@ -274,8 +306,14 @@ void IpSecConfigImpl::GetSADConfigList(std::vector<Net::IpSecSadParam>& out) con
 
 void IpSecConfigImpl::RemoveSADConfig(std::string name) {
     Enter("RemoveSADConfig", name);
-    if (!FindNamedSa(Lib::Read<Model::IpsecSection>(), name))
-        throw HostCtlException("Security Association " + Quoted(name) + " does not exist");
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetIpsec();
+        auto sas = area.ListSas(false);
+        if (std::none_of(sas.begin(), sas.end(), [&](const auto& sa) { return IsNamedOnRealHost(sa, name); }))
+            throw HostCtlException(SaNotFound(name));
+        return area.RemoveSa(name);
+    }
+    if (!FindNamedSa(Lib::Read<Model::IpsecSection>(), name)) throw HostCtlException(SaNotFound(name));
     auto& ipsec = Lib::Write<Model::IpsecSection>();
     ipsec.sas.erase(
         std::remove_if(ipsec.sas.begin(), ipsec.sas.end(),
@@ -287,21 +325,28 @@ void IpSecConfigImpl::RemoveSADConfig(std::string name) {
 void IpSecConfigImpl::RemoveAutoSADConfig(const Net::IpSecSadParam& sa) {
     Enter("RemoveAutoSADConfig", {},
           Lib::Args(sa.source.GetStringAddress(), sa.destination.GetStringAddress(), Hex(sa.spi)));
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetIpsec();
+        auto sas = area.ListSas(false);
+        if (std::none_of(sas.begin(), sas.end(), [&](const Net::IpSecSadParam& s) {
+                return s.name == kAutoSaName && s.source == sa.source && s.destination == sa.destination &&
+                       s.spi == sa.spi;
+            }))
+            throw HostCtlException(NoAutoSa(sa));
+        return area.RemoveAutoSa(sa.source, sa.destination, sa.spi);
+    }
     auto matches = [&](const Model::IpsecSa& s) {
         return s.automatic && s.source == sa.source && s.destination == sa.destination && s.spi == sa.spi;
     };
     const auto& sas = Lib::Read<Model::IpsecSection>().sas;
-    if (std::none_of(sas.begin(), sas.end(), matches)) {
-        throw HostCtlException("No automatic Security Association has source " +
-                               sa.source.GetStringAddress() + ", destination " +
-                               sa.destination.GetStringAddress() + " and SPI " + Hex(sa.spi));
-    }
+    if (std::none_of(sas.begin(), sas.end(), matches)) throw HostCtlException(NoAutoSa(sa));
     auto& list = Lib::Write<Model::IpsecSection>().sas;
     list.erase(std::remove_if(list.begin(), list.end(), matches), list.end());
 }
 
 void IpSecConfigImpl::FlushSADConfig() {
     Enter("FlushSADConfig");
+    if (auto* host = Lib::RealHost()) return host->GetIpsec().FlushSas();
     if (Lib::Read<Model::IpsecSection>().sas.empty()) return;
     auto& ipsec = Lib::Write<Model::IpsecSection>();
     ipsec.sas.clear();
@@ -333,13 +378,26 @@ void IpSecConfigImpl::AddSPDConfig(const Net::IpSecSpdParam& sp) {
     Net::Ipv6Network source(sp.sourceAddress, sp.sourcePrefixLength);
     Net::Ipv6Network destination(sp.destinationAddress, sp.destinationPrefixLength);
 
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetIpsec();
+        for (const auto& other : area.ListSps(false)) {
+            if (other.spName == sp.spName)
+                throw HostCtlException("Security Policy " + Quoted(sp.spName) + " already exists");
+        }
+        if (!sp.saName.empty()) {
+            auto sas = area.ListSas(false);
+            if (std::none_of(sas.begin(), sas.end(),
+                             [&](const auto& sa) { return IsNamedOnRealHost(sa, sp.saName); }))
+                throw HostCtlException(SaNotFound(sp.saName));
+        }
+        return area.AddSp(sp);
+    }
     const auto& ipsec = Lib::Read<Model::IpsecSection>();
     for (const auto& other : ipsec.sps) {
         if (other.name == sp.spName)
             throw HostCtlException("Security Policy " + Quoted(sp.spName) + " already exists");
     }
-    if (!sp.saName.empty() && !FindNamedSa(ipsec, sp.saName))
-        throw HostCtlException("Security Association " + Quoted(sp.saName) + " does not exist");
+    if (!sp.saName.empty() && !FindNamedSa(ipsec, sp.saName)) throw HostCtlException(SaNotFound(sp.saName));
 
     Model::IpsecSp stored;
     stored.name = sp.spName;
@@ -357,6 +415,10 @@ void IpSecConfigImpl::AddSPDConfig(const Net::IpSecSpdParam& sp) {
 
 void IpSecConfigImpl::GetSPDConfigList(std::vector<Net::IpSecSpdParam>& out) const {
     Enter("GetSPDConfigList");
+    if (auto* host = Lib::RealHost()) {
+        out = host->GetIpsec().ListSps(true);
+        return;
+    }
     out.clear();
     for (const auto& sp : Lib::Read<Model::IpsecSection>().sps) {
         Net::IpSecSpdParam param;
@@ -378,16 +440,24 @@ void IpSecConfigImpl::GetSPDConfigList(std::vector<Net::IpSecSpdParam>& out) con
 
 void IpSecConfigImpl::RemoveSPDConfig(std::string name) {
     Enter("RemoveSPDConfig", name);
+    const std::string notFound = "Security Policy " + Quoted(name) + " does not exist";
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetIpsec();
+        auto sps = area.ListSps(false);
+        if (std::none_of(sps.begin(), sps.end(), [&](const auto& sp) { return sp.spName == name; }))
+            throw HostCtlException(notFound);
+        return area.RemoveSp(name);
+    }
     const auto& sps = Lib::Read<Model::IpsecSection>().sps;
     auto named = [&](const Model::IpsecSp& sp) { return sp.name == name; };
-    if (std::none_of(sps.begin(), sps.end(), named))
-        throw HostCtlException("Security Policy " + Quoted(name) + " does not exist");
+    if (std::none_of(sps.begin(), sps.end(), named)) throw HostCtlException(notFound);
     auto& list = Lib::Write<Model::IpsecSection>().sps;
     list.erase(std::remove_if(list.begin(), list.end(), named), list.end());
 }
 
 void IpSecConfigImpl::FlushSPDConfig() {
     Enter("FlushSPDConfig");
+    if (auto* host = Lib::RealHost()) return host->GetIpsec().FlushSps();
     if (Lib::Read<Model::IpsecSection>().sps.empty()) return;
     Lib::Write<Model::IpsecSection>().sps.clear();
 }

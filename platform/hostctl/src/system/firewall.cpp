@@ -4,6 +4,8 @@
 #include <algorithm>
 #include <limits>
 
+#include "backend/firewall.h"
+#include "backend/host.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -34,13 +36,33 @@ using Model::FirewallSection;
 
 namespace {
 
+std::string NotLoaded() {
+    return std::string("The firewall module '") + Model::kFirewallModule + "' is not loaded";
+}
+
 // The firewall section, for reading, once the module is known to be loaded.
 const FirewallSection& Loaded() {
     const auto& section = Lib::Read<FirewallSection>();
-    if (!section.moduleLoaded)
-        throw HostCtlException(std::string("The firewall module '") + Model::kFirewallModule +
-                               "' is not loaded");
+    if (!section.moduleLoaded) throw HostCtlException(NotLoaded());
     return section;
+}
+
+// ---------------------------------------------------------------- a real host
+
+// The real host's firewall as it is now, once the module is known to be loaded.
+Backend::FirewallState LoadedState(Backend::Host& host) {
+    auto state = host.GetFirewall().Read();
+    if (!state.loaded) throw HostCtlException(NotLoaded());
+    return state;
+}
+
+std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> ToRules(
+    const std::vector<HostCtl::System::FirewallRule>& rules) {
+    std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> out;
+    out.reserve(rules.size());
+    for (const auto& rule : rules)
+        out.push_back(std::make_unique<HostCtl::System::FirewallRule>(rule));
+    return out;
 }
 
 // The same, for changing it.
@@ -76,6 +98,11 @@ std::string RuleText(const HostCtl::System::FirewallRule& rule) {
     return code(rule.GetPortType(), "src", "dst") + " " + std::to_string(rule.GetPortBegin()) + "-" +
            std::to_string(rule.GetPortEnd()) + " " + code(rule.GetDirection(), "inbound", "outbound") + " " +
            code(rule.GetProtocol(), "tcp", "udp");
+}
+
+bool WellFormed(const HostCtl::System::FirewallRule& rule) {
+    return rule.GetPortType() <= 1 && rule.GetDirection() <= 1 && rule.GetProtocol() <= 1 &&
+           rule.GetPortEnd() <= 65535 && rule.GetPortBegin() <= rule.GetPortEnd();
 }
 
 Model::AllowedIp ParseOrThrow(const std::string& text) {
@@ -209,6 +236,135 @@ private:
     std::string id_;
 };
 
+// A ruleset of a real host by id; it reads the host at each call and hands each change to it
+// as the whole firewall wanted.
+class RealFirewallRuleset : public HostCtl::System::FirewallRuleset, public Lib::TknCtlObject {
+public:
+    RealFirewallRuleset(Backend::Host& host, std::string id) : host_(host), id_(std::move(id)) {}
+
+    std::string GetName() override { return Get("GetName").name; }
+    bool IsEnabled() override { return Get("IsEnabled").enabled; }
+    void Enable() override {
+        Get("Enable").enabled = true;
+        Apply();
+    }
+    void Disable() override {
+        Get("Disable").enabled = false;
+        Apply();
+    }
+    std::int32_t GetClientCount() override { return Get("GetClientCount").clients; }
+
+    void AddClient() override {
+        auto& ruleset = Get("AddClient");
+        if (ruleset.clients == std::numeric_limits<std::int32_t>::max())
+            throw HostCtlException("Ruleset " + Lib::Quote(id_) + " cannot take more clients");
+        ++ruleset.clients;
+        ruleset.enabled = true;
+        Apply();
+    }
+
+    void RemoveClient() override {
+        auto& ruleset = Get("RemoveClient");
+        if (ruleset.clients <= 0) throw HostCtlException("Ruleset " + Lib::Quote(id_) + " has no clients");
+        if (--ruleset.clients == 0) ruleset.enabled = false;
+        Apply();
+    }
+
+    std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> GetRules() override {
+        return ToRules(Get("GetRules").rules);
+    }
+
+    std::unique_ptr<HostCtl::System::FirewallAllowedIps> GetAllowedIps() override {
+        using namespace HostCtl::Network;
+        auto out = std::make_unique<HostCtl::System::FirewallAllowedIps>();
+        for (const auto& text : Get("GetAllowedIps").allowedIps) {
+            auto entry = Model::ParseAllowedIp(text);
+            if (!entry) continue;
+            switch (entry->kind) {
+                case Model::AllowedIpKind::kIpv4Address:
+                    out->AddIpv4Address(Ipv4Address(entry->text));
+                    break;
+                case Model::AllowedIpKind::kIpv4Network:
+                    out->AddIpv4Network(Ipv4Network(entry->text));
+                    break;
+                case Model::AllowedIpKind::kIpv6Address:
+                    out->AddIpv6Address(Ipv6Address(entry->text));
+                    break;
+                case Model::AllowedIpKind::kIpv6Network:
+                    out->AddIpv6Network(Ipv6Network(entry->text));
+                    break;
+            }
+        }
+        return out;
+    }
+
+    void AddAllowedIp(const std::string& address) override {
+        auto& ruleset = Get("AddAllowedIp", address);
+        const std::string entry = HostText(ParseOrThrow(address));
+        auto& list = ruleset.allowedIps;
+        if (std::find(list.begin(), list.end(), entry) != list.end()) {
+            throw HostCtlException(Lib::Quote(address) + " is already on the allowed list of ruleset " +
+                                   Lib::Quote(id_));
+        }
+        list.push_back(entry);
+        Apply();
+    }
+
+    void RemoveAllowedIp(const std::string& address) override {
+        auto& ruleset = Get("RemoveAllowedIp", address);
+        const std::string entry = HostText(ParseOrThrow(address));
+        auto& list = ruleset.allowedIps;
+        auto it = std::find(list.begin(), list.end(), entry);
+        if (it == list.end()) {
+            throw HostCtlException(Lib::Quote(address) + " is not on the allowed list of ruleset " +
+                                   Lib::Quote(id_));
+        }
+        list.erase(it);
+        Apply();
+    }
+
+    bool IsValid() override {
+        Enter("IsValid");
+        state_ = LoadedState(host_);
+        return state_.Find(id_) != nullptr;
+    }
+
+    void SetAllowedAll(bool allowedAll) override {
+        Get("SetAllowedAll", Lib::Args(allowedAll)).allowedAll = allowedAll;
+        Apply();
+    }
+    bool IsAllowedAll() override { return Get("IsAllowedAll").allowedAll; }
+
+private:
+    void Enter(const char* operation, const std::string& arguments = {}) const {
+        Lib::Enter(std::string("HostCtl::System::FirewallRuleset::") + operation, id_, arguments);
+    }
+
+    // Starts an operation: the host's firewall now, and the ruleset in it.
+    Backend::FirewallRulesetState& Get(const char* operation, const std::string& arguments = {}) {
+        Enter(operation, arguments);
+        state_ = LoadedState(host_);
+        auto* ruleset = state_.Find(id_);
+        if (!ruleset) throw HostCtlException("Ruleset " + Lib::Quote(id_) + " not found");
+        return *ruleset;
+    }
+    void Apply() { host_.GetFirewall().Write(state_); }
+
+    // An entry as the host keeps it: a network of one address is that address.
+    static std::string HostText(const Model::AllowedIp& entry) {
+        const auto& text = entry.text;
+        auto slash = text.find('/');
+        if (slash == std::string::npos) return text;
+        const bool v4 = entry.kind == Model::AllowedIpKind::kIpv4Network;
+        if (text.substr(slash + 1) == (v4 ? "32" : "128")) return text.substr(0, slash);
+        return text;
+    }
+
+    Backend::Host& host_;
+    std::string id_;
+    Backend::FirewallState state_;
+};
+
 }  // namespace
 
 SystemInfoImpl::SystemInfoImpl() = default;
@@ -216,27 +372,44 @@ SystemInfoImpl::~SystemInfoImpl() = default;
 
 bool SystemInfoImpl::IsFirewallEnabled() {
     Lib::Enter("TknCtl::System::SystemInfoImpl::IsFirewallEnabled");
+    if (auto* host = Lib::RealHost()) return LoadedState(*host).enabled;
     return Loaded().enabled;
 }
 
 void SystemInfoImpl::SetFirewallEnabled(bool enabled) {
     Lib::Enter("TknCtl::System::SystemInfoImpl::SetFirewallEnabled", {}, Lib::Args(enabled));
+    if (auto* host = Lib::RealHost()) {
+        auto state = LoadedState(*host);
+        state.enabled = enabled;
+        return host->GetFirewall().Write(state);
+    }
     LoadedForWrite().enabled = enabled;
 }
 
 bool SystemInfoImpl::GetFirewallDefaultAction() {
     Lib::Enter("TknCtl::System::SystemInfoImpl::GetFirewallDefaultAction");
+    if (auto* host = Lib::RealHost()) return LoadedState(*host).pass;
     return Loaded().defaultActionPass;
 }
 
 void SystemInfoImpl::SetFirewallDefaultAction(bool pass) {
     Lib::Enter("TknCtl::System::SystemInfoImpl::SetFirewallDefaultAction", {}, Lib::Args(pass));
+    if (auto* host = Lib::RealHost()) {
+        auto state = LoadedState(*host);
+        state.pass = pass;
+        return host->GetFirewall().Write(state);
+    }
     LoadedForWrite().defaultActionPass = pass;
 }
 
 std::vector<std::unique_ptr<HostCtl::System::FirewallRuleset>> SystemInfoImpl::GetFirewallRulesets() {
     Lib::Enter("TknCtl::System::SystemInfoImpl::GetFirewallRulesets");
     std::vector<std::unique_ptr<HostCtl::System::FirewallRuleset>> out;
+    if (auto* host = Lib::RealHost()) {
+        for (const auto& ruleset : LoadedState(*host).rulesets)
+            out.push_back(std::make_unique<RealFirewallRuleset>(*host, ruleset.name));
+        return out;
+    }
     for (const auto& ruleset : Loaded().rulesets)
         out.push_back(std::make_unique<FirewallRulesetImpl>(ruleset.id));
     return out;
@@ -245,12 +418,22 @@ std::vector<std::unique_ptr<HostCtl::System::FirewallRuleset>> SystemInfoImpl::G
 std::unique_ptr<HostCtl::System::FirewallRuleset> SystemInfoImpl::GetFirewallRulesetById(
     const std::string& id) {
     Lib::Enter("TknCtl::System::SystemInfoImpl::GetFirewallRulesetById", id);
+    if (auto* host = Lib::RealHost()) {
+        LoadedState(*host);
+        return std::make_unique<RealFirewallRuleset>(*host, id);
+    }
     Loaded();
     return std::make_unique<FirewallRulesetImpl>(id);
 }
 
 void SystemInfoImpl::LoadFirewallRulesets() {
     Lib::Enter("TknCtl::System::SystemInfoImpl::LoadFirewallRulesets");
+    if (auto* host = Lib::RealHost()) {
+        auto state = LoadedState(*host);
+        host->GetFirewall().Reconfigure(state);
+        state.dynamicRules.clear();
+        return host->GetFirewall().Write(state);
+    }
     auto& section = LoadedForWrite();
     section.filtersInstalled = true;
     section.dynamicRules.clear();
@@ -258,6 +441,12 @@ void SystemInfoImpl::LoadFirewallRulesets() {
 
 void SystemInfoImpl::DestroyFirewallFilters() {
     Lib::Enter("TknCtl::System::SystemInfoImpl::DestroyFirewallFilters");
+    if (auto* host = Lib::RealHost()) {
+        // The filters are the firewall's table: they go with the module; the dynamic rules go now.
+        auto state = LoadedState(*host);
+        state.dynamicRules.clear();
+        return host->GetFirewall().Write(state);
+    }
     auto& section = LoadedForWrite();
     section.filtersInstalled = false;
     section.dynamicRules.clear();
@@ -265,20 +454,29 @@ void SystemInfoImpl::DestroyFirewallFilters() {
 
 std::vector<std::unique_ptr<HostCtl::System::FirewallRule>> SystemInfoImpl::GetFirewallDynamicRules() {
     Lib::Enter("TknCtl::System::SystemInfoImpl::GetFirewallDynamicRules");
+    if (auto* host = Lib::RealHost()) return ToRules(LoadedState(*host).dynamicRules);
     return ToRules(Loaded().dynamicRules);
 }
 
 void SystemInfoImpl::AddFirewallDynamicRule(HostCtl::System::FirewallRule& rule) {
     const std::string text = RuleText(rule);
     Lib::Enter("TknCtl::System::SystemInfoImpl::AddFirewallDynamicRule", {}, text);
+    if (auto* host = Lib::RealHost()) {
+        auto state = LoadedState(*host);
+        if (!WellFormed(rule)) throw HostCtlException("Invalid dynamic rule " + text);
+        for (const auto& existing : state.dynamicRules) {
+            if (existing == rule)
+                throw HostCtlException("The dynamic rule " + text + " is already installed");
+        }
+        state.dynamicRules.push_back(rule);
+        return host->GetFirewall().Write(state);
+    }
     const auto& section = Loaded();
     if (!section.filtersInstalled)
         throw HostCtlException(
             "Cannot add the dynamic rule " + text +
             ": the firewall filters are not installed (load the ruleset configuration first)");
-    if (rule.GetPortType() > 1 || rule.GetDirection() > 1 || rule.GetProtocol() > 1 ||
-        rule.GetPortEnd() > 65535 || rule.GetPortBegin() > rule.GetPortEnd())
-        throw HostCtlException("Invalid dynamic rule " + text);
+    if (!WellFormed(rule)) throw HostCtlException("Invalid dynamic rule " + text);
     Model::FirewallRule added{rule.GetPortType(), rule.GetPortBegin(), rule.GetPortEnd(), rule.GetDirection(),
                               rule.GetProtocol()};
     for (const auto& existing : section.dynamicRules) {

@@ -1,15 +1,20 @@
 #include "kernel/links.h"
 
 #include <linux/if.h>
+#include <linux/ipv6.h>
+#include <linux/rtnetlink.h>
+#include <netlink/attr.h>
 #include <netlink/cache.h>
 #include <netlink/msg.h>
 #include <netlink/netlink.h>
 #include <netlink/route/link.h>
 
+#include <algorithm>
 #include <cstring>
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/request.h"
 
 namespace TknCtl::Linux::Kernel {
 
@@ -17,16 +22,12 @@ using HostCtl::Lib::HostCtlException;
 
 namespace {
 
-struct CacheFree {
-    void operator()(nl_cache* cache) const { nl_cache_free(cache); }
-};
 struct LinkPut {
     void operator()(rtnl_link* link) const { rtnl_link_put(link); }
 };
 struct AddrPut {
     void operator()(nl_addr* addr) const { nl_addr_put(addr); }
 };
-using Cache = std::unique_ptr<nl_cache, CacheFree>;
 using LinkObject = std::unique_ptr<rtnl_link, LinkPut>;
 
 std::string AddressText(nl_addr* addr) {
@@ -37,10 +38,29 @@ std::string AddressText(nl_addr* addr) {
     return text == "none" ? std::string() : text;
 }
 
-Cache LinkCache(const Namespace& ns) {
-    nl_cache* cache = nullptr;
-    Check(rtnl_link_alloc_cache(RouteSocket(ns), AF_UNSPEC, &cache), "cannot list the network devices");
-    return Cache(cache);
+// The IPv6 settings of IFLA_AF_SPEC / AF_INET6 / IFLA_INET6_CONF: one 32-bit value per
+// setting, indexed by DEVCONF_....
+std::optional<Link::Ipv6Settings> ParseIpv6Settings(nlmsghdr* header) {
+    if (!nlmsg_valid_hdr(header, sizeof(ifinfomsg))) return std::nullopt;
+    nlattr* tb[IFLA_MAX + 1] = {};
+    if (nlmsg_parse(header, sizeof(ifinfomsg), tb, IFLA_MAX, nullptr) < 0 || !tb[IFLA_AF_SPEC])
+        return std::nullopt;
+    nlattr* family = nullptr;
+    int remaining = 0;
+    nla_for_each_nested(family, tb[IFLA_AF_SPEC], remaining) {
+        if (nla_type(family) != AF_INET6) continue;
+        nlattr* inet6[IFLA_INET6_MAX + 1] = {};
+        if (nla_parse_nested(inet6, IFLA_INET6_MAX, family, nullptr) < 0 || !inet6[IFLA_INET6_CONF]) break;
+        const auto* values = static_cast<const std::int32_t*>(nla_data(inet6[IFLA_INET6_CONF]));
+        int count = nla_len(inet6[IFLA_INET6_CONF]) / static_cast<int>(sizeof(std::int32_t));
+        auto value = [&](int index) { return index < count ? values[index] : 0; };
+        Link::Ipv6Settings settings;
+        settings.forwarding = value(DEVCONF_FORWARDING) != 0;
+        settings.acceptRa = value(DEVCONF_ACCEPT_RA);
+        settings.disabled = value(DEVCONF_DISABLE_IPV6) != 0;
+        return settings;
+    }
+    return std::nullopt;
 }
 
 }  // namespace
@@ -65,6 +85,8 @@ Link LinkFromObject(rtnl_link* object) {
     link.txQueueLength = rtnl_link_get_txqlen(object);
     link.numTxQueues = rtnl_link_get_num_tx_queues(object);
     link.numRxQueues = rtnl_link_get_num_rx_queues(object);
+    std::uint32_t gsoMaxSize = 0;
+    if (rtnl_link_get_gso_max_size(object, &gsoMaxSize) == 0) link.gsoMaxSize = gsoMaxSize;
     auto stat = [&](rtnl_link_stat_id_t id) { return rtnl_link_get_stat(object, id); };
     auto& s = link.stats;
     s.rxPackets = stat(RTNL_LINK_RX_PACKETS);
@@ -98,15 +120,21 @@ std::optional<Link> ParseLink(nl_msg* message) {
             *static_cast<std::optional<Link>*>(arg) = LinkFromObject(reinterpret_cast<rtnl_link*>(object));
     };
     nl_msg_parse(message, take, &out);
+    if (out) out->ipv6 = ParseIpv6Settings(nlmsg_hdr(message));
     return out;
 }
 
 std::vector<Link> ListLinks(const Namespace& ns) {
-    Cache cache = LinkCache(ns);
     std::vector<Link> links;
-    links.reserve(static_cast<std::size_t>(nl_cache_nitems(cache.get())));
-    for (nl_object* object = nl_cache_get_first(cache.get()); object; object = nl_cache_get_next(object))
-        links.push_back(LinkFromObject(reinterpret_cast<rtnl_link*>(object)));
+    ifinfomsg header{};
+    header.ifi_family = AF_UNSPEC;
+    Dump(
+        ns, RTM_GETLINK, &header, sizeof(header), [&] { links.clear(); },
+        [&](nl_msg* message) {
+            if (auto link = ParseLink(message)) links.push_back(std::move(*link));
+        },
+        "cannot list the network devices");
+    std::sort(links.begin(), links.end(), [](const Link& a, const Link& b) { return a.index < b.index; });
     return links;
 }
 
@@ -150,9 +178,7 @@ void ChangeLink(const Namespace& ns, const std::string& name, const LinkChange& 
     if (change.Empty()) return;
     auto link = FindLink(ns, name);
     if (!link) throw HostCtlException("Network device " + name + " does not exist");
-    nl_msg* message = BuildLinkChange(link->index, change);
-    int error = nl_send_sync(RouteSocket(ns), message);  // frees the message
-    Check(error, "Cannot change network device " + name);
+    Request(ns, BuildLinkChange(link->index, change), "Cannot change network device " + name);
 }
 
 }  // namespace TknCtl::Linux::Kernel

@@ -42,7 +42,18 @@ struct Link {
     bool loopback = false;
     std::uint32_t txQueueLength = 0;
     std::uint32_t numTxQueues = 0, numRxQueues = 0;
+    std::uint32_t gsoMaxSize = 0;  // the largest packet the stack hands the device to segment
     LinkStats stats;
+
+    // The device's IPv6 settings (the sysctls of net/ipv6/conf/DEVICE, as rtnetlink reports
+    // them); nothing when the device has no IPv6 state. Filled by ListLinks and ParseLink.
+    struct Ipv6Settings {
+        bool disabled = false;  // disable_ipv6
+        int acceptRa = 0;       // accept_ra: 0 never, 1 unless forwarding, 2 even when forwarding
+        bool forwarding = false;
+        bool AcceptsRouterAdvertisements() const { return acceptRa == 2 || (acceptRa == 1 && !forwarding); }
+    };
+    std::optional<Ipv6Settings> ipv6;
 };
 
 // Every link of the namespace, in index order.
@@ -63,7 +74,8 @@ struct LinkChange {
 // kernel's refusal.
 void ChangeLink(const Namespace& ns, const std::string& name, const LinkChange& change);
 
-// A link as a libnl object reads into a plain value.
+// A link as a libnl object reads into a plain value (without its IPv6 settings, which libnl
+// does not hand out).
 Link LinkFromObject(rtnl_link* object);
 // A reply message (RTM_NEWLINK) reads into a plain value; nothing when it is no link message.
 std::optional<Link> ParseLink(nl_msg* message);

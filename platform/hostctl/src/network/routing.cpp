@@ -1,6 +1,8 @@
 // Routes, default gateways and neighbours of the Tarkon netstacks.
 #include <algorithm>
 
+#include "backend/host.h"
+#include "backend/routing.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -295,6 +297,147 @@ void RemoveNeighbor(const std::string& netstack, const Neighbor& neighbor) {
     std::erase_if(Table(*Lib::Write<Model::NeighborsSection>().Find(netstack), tag), matches);
 }
 
+// ---------------------------------------------------------------- a real host
+
+// The routing area of the real host the session manages, or nullptr on the simulated host.
+Backend::Routing* RealRouting() {
+    auto* host = Lib::RealHost();
+    return host ? &host->GetRouting() : nullptr;
+}
+
+bool IsLinkLocal(const Ipv4Address&) {
+    return false;
+}
+bool IsLinkLocal(const Ipv6Address& address) {
+    return address.IsLinkLocal();
+}
+
+template <class Route>
+std::string ViaText(const Route& route) {
+    return route.gateway.IsUnspecified() ? "on " + route.interfaceName
+                                         : "via " + route.gateway.GetStringAddress();
+}
+
+std::vector<Backend::HostIpv4Route> HostRoutes(Backend::Routing& area, const std::string& netstack,
+                                               const Ipv4Network*) {
+    return area.Ipv4Routes(netstack);
+}
+std::vector<Backend::HostIpv6Route> HostRoutes(Backend::Routing& area, const std::string& netstack,
+                                               const Ipv6Network*) {
+    return area.Ipv6Routes(netstack);
+}
+
+// The interface a route via the gateway goes through: the first of the netstack on whose
+// subnet the gateway lies. A link-local gateway lies on every link: it is taken only when one
+// interface alone reaches it.
+template <class Address>
+std::string RealReaching(Backend::Routing& area, const std::string& netstack, const Address& gateway) {
+    if (gateway.IsUnspecified()) throw HostCtlException("A route needs a gateway address");
+    auto nics = area.InterfacesReaching(netstack, gateway);
+    if (nics.empty()) {
+        throw HostCtlException("Gateway " + gateway.GetStringAddress() +
+                               " is unreachable: no Tarkon interface of " + "netstack " +
+                               Lib::Quote(netstack) + " is on its subnet");
+    }
+    if (IsLinkLocal(gateway) && nics.size() > 1) {
+        std::string names;
+        for (const auto& nic : nics)
+            names += (names.empty() ? "" : ", ") + nic;
+        throw HostCtlException("Gateway " + gateway.GetStringAddress() +
+                               " is a link-local address, on the link of " + "each of " + names +
+                               ": give an address of the gateway on a subnet of one of them");
+    }
+    return nics.front();
+}
+
+template <class Network, class Address>
+void RealAddRoute(Backend::Routing& area, const std::string& netstack, const Network& given,
+                  const Address& gateway) {
+    const Network network = Normal(given);
+    const Network* tag = nullptr;
+    for (const auto& route : HostRoutes(area, netstack, tag)) {
+        if (Normal(route.network) == network) {
+            throw HostCtlException("A route to " + Text(network) + " already exists on netstack " +
+                                   Lib::Quote(netstack) + " (" + ViaText(route) + ")");
+        }
+    }
+    area.AddRoute(netstack, network, gateway, RealReaching(area, netstack, gateway));
+}
+
+template <class Network, class Address>
+void RealRemoveRoute(Backend::Routing& area, const std::string& netstack, const Network& given,
+                     const Address& gateway) {
+    const Network network = Normal(given);
+    const Network* tag = nullptr;
+    auto routes = HostRoutes(area, netstack, tag);
+    auto route = std::find_if(routes.begin(), routes.end(), [&](const auto& r) {
+        return Normal(r.network) == network && r.gateway == gateway;
+    });
+    if (route == routes.end()) {
+        throw HostCtlException("Netstack " + Lib::Quote(netstack) + " has no route to " + Text(network) +
+                               " via " + gateway.GetStringAddress());
+    }
+    if (route->connected) {
+        throw HostCtlException("The route to " + Text(network) + " belongs to the address of " +
+                               route->interfaceName + " and goes only with it");
+    }
+    area.RemoveRoute(netstack, *route);
+}
+
+bool IsDefault(const Backend::HostIpv4Route& route) {
+    return route.network.GetPrefixLength() == 0;
+}
+bool IsDefault(const Backend::HostIpv6Route& route) {
+    return route.network.GetNetmask() == 0;
+}
+
+// The default route in force: of the default routes, the one of the lowest metric (the first
+// of those when several share it); nullptr when there is none.
+template <class Route>
+const Route* DefaultInForce(const std::vector<Route>& routes) {
+    const Route* best = nullptr;
+    for (const auto& route : routes) {
+        if (IsDefault(route) && (!best || route.metric < best->metric)) best = &route;
+    }
+    return best;
+}
+
+template <class Network, class Address>
+Address RealDefaultGateway(Backend::Routing& area, const std::string& netstack) {
+    const Network* tag = nullptr;
+    auto routes = HostRoutes(area, netstack, tag);
+    const auto* route = DefaultInForce(routes);
+    return route ? route->gateway : Address();
+}
+
+// Replaces the default route in force with one via the gateway (the unset address only takes
+// it away). When the new route is refused the old one is put back.
+template <class Network, class Address>
+void RealSetDefaultGateway(Backend::Routing& area, const std::string& netstack, const Address& gateway) {
+    const Network* tag = nullptr;
+    auto routes = HostRoutes(area, netstack, tag);
+    const auto* current = DefaultInForce(routes);
+    if (gateway.IsUnspecified()) {
+        if (current) area.RemoveRoute(netstack, *current);
+        return;
+    }
+    std::string nic = RealReaching(area, netstack, gateway);
+    if (current && current->gateway == gateway && current->interfaceName == nic) return;
+    if (current) area.RemoveRoute(netstack, *current);
+    try {
+        area.AddRoute(netstack, Network(), gateway, nic);
+    } catch (const HostCtlException&) {
+        if (current && !current->gateway.IsUnspecified()) {
+            try {
+                area.AddRoute(netstack, Network(), current->gateway, current->interfaceName);
+            } catch (const HostCtlException&) {
+                // The refusal of the new route is what the caller learns.
+            }
+        }
+        throw;
+    }
+}
+
 }  // namespace
 
 RoutingInfoImpl::RoutingInfoImpl(const std::string& netstack) : netstack_(netstack) {}
@@ -302,14 +445,23 @@ RoutingInfoImpl::~RoutingInfoImpl() = default;
 
 void RoutingInfoImpl::SetNetstackInstanceKey(const std::string& netstack) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::SetNetstackInstanceKey", netstack);
-    RequireNetstack(netstack);
+    if (auto* area = RealRouting()) {
+        area->RequireNetstack(netstack);
+    } else {
+        RequireNetstack(netstack);
+    }
     netstack_ = netstack;
 }
 
 std::vector<HostCtl::Network::Ipv4Route> RoutingInfoImpl::GetCurrentTarkonRoutes() {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetCurrentTarkonRoutes", netstack_);
-    RequireNetstack(netstack_);
     std::vector<HostCtl::Network::Ipv4Route> out;
+    if (auto* area = RealRouting()) {
+        for (auto& r : area->Ipv4Routes(netstack_))
+            out.push_back({r.network, r.gateway, std::move(r.interfaceName)});
+        return out;
+    }
+    RequireNetstack(netstack_);
     if (const auto* stack = Lib::Read<Model::RoutesSection>().Find(netstack_)) {
         for (const auto& r : stack->ipv4)
             out.push_back({r.network, r.gateway, r.interface});
@@ -319,8 +471,13 @@ std::vector<HostCtl::Network::Ipv4Route> RoutingInfoImpl::GetCurrentTarkonRoutes
 
 std::vector<HostCtl::Network::Ipv6Route> RoutingInfoImpl::GetCurrentIpv6TarkonRoutes() {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetCurrentIpv6TarkonRoutes", netstack_);
-    RequireNetstack(netstack_);
     std::vector<HostCtl::Network::Ipv6Route> out;
+    if (auto* area = RealRouting()) {
+        for (auto& r : area->Ipv6Routes(netstack_))
+            out.push_back({r.network, r.gateway, std::move(r.interfaceName)});
+        return out;
+    }
+    RequireNetstack(netstack_);
     if (const auto* stack = Lib::Read<Model::RoutesSection>().Find(netstack_)) {
         for (const auto& r : stack->ipv6)
             out.push_back({r.network, r.gateway, r.interface});
@@ -331,32 +488,42 @@ std::vector<HostCtl::Network::Ipv6Route> RoutingInfoImpl::GetCurrentIpv6TarkonRo
 void RoutingInfoImpl::AddTarkonRoute(const Ipv4Network& network, const Ipv4Address& gateway) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::AddTarkonRoute", netstack_,
                Lib::Args(network.GetStringAddress(), gateway.GetStringAddress()));
+    if (auto* area = RealRouting()) return RealAddRoute(*area, netstack_, network, gateway);
     AddRoute(netstack_, network, gateway);
 }
 
 void RoutingInfoImpl::AddIpv6TarkonRoute(const Ipv6Network& network, const Ipv6Address& gateway) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::AddIpv6TarkonRoute", netstack_,
                Lib::Args(network.GetStringAddress(), gateway.GetStringAddress()));
+    if (auto* area = RealRouting()) return RealAddRoute(*area, netstack_, network, gateway);
     AddRoute(netstack_, network, gateway);
 }
 
 void RoutingInfoImpl::RemoveTarkonRoute(const Ipv4Network& network, const Ipv4Address& gateway) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::RemoveTarkonRoute", netstack_,
                Lib::Args(network.GetStringAddress(), gateway.GetStringAddress()));
+    if (auto* area = RealRouting()) return RealRemoveRoute(*area, netstack_, network, gateway);
     RemoveRoute(netstack_, network, gateway);
 }
 
 void RoutingInfoImpl::RemoveIpv6TarkonRoute(const Ipv6Network& network, const Ipv6Address& gateway) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::RemoveIpv6TarkonRoute", netstack_,
                Lib::Args(network.GetStringAddress(), gateway.GetStringAddress()));
+    if (auto* area = RealRouting()) return RealRemoveRoute(*area, netstack_, network, gateway);
     RemoveRoute(netstack_, network, gateway);
 }
 
 std::string RoutingInfoImpl::GetDefaultGatewaySource(const Ipv4Network& network) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetDefaultGatewaySource", netstack_,
                network.GetStringAddress());
-    RequireNetstack(netstack_);
     Ipv4Network wanted = Normal(network);
+    if (auto* area = RealRouting()) {
+        std::string source = area->Ipv4RouteSource(netstack_, wanted);
+        if (!source.empty()) return source;
+        throw HostCtlException("Netstack " + Lib::Quote(netstack_) + " has no route to " +
+                               wanted.GetStringAddress());
+    }
+    RequireNetstack(netstack_);
     if (const auto* stack = Lib::Read<Model::RoutesSection>().Find(netstack_)) {
         for (const auto& r : stack->ipv4) {
             if (r.network == wanted) return r.source;
@@ -368,16 +535,20 @@ std::string RoutingInfoImpl::GetDefaultGatewaySource(const Ipv4Network& network)
 
 Ipv4Address RoutingInfoImpl::GetTarkonDefaultGateway() {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetTarkonDefaultGateway", netstack_);
+    if (auto* area = RealRouting()) return RealDefaultGateway<Ipv4Network, Ipv4Address>(*area, netstack_);
     return DefaultGateway<Ipv4Network, Ipv4Address>(netstack_);
 }
 
 Ipv6Address RoutingInfoImpl::GetIpv6TarkonDefaultGateway() {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetIpv6TarkonDefaultGateway", netstack_);
+    if (auto* area = RealRouting()) return RealDefaultGateway<Ipv6Network, Ipv6Address>(*area, netstack_);
     return DefaultGateway<Ipv6Network, Ipv6Address>(netstack_);
 }
 
 Ipv4Address RoutingInfoImpl::GetTarkonConfigDefaultGateway() {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetTarkonConfigDefaultGateway", netstack_);
+    // A real host keeps no default gateway apart from its default route.
+    if (auto* area = RealRouting()) return RealDefaultGateway<Ipv4Network, Ipv4Address>(*area, netstack_);
     RequireNetstack(netstack_);
     const auto* stack = Lib::Read<Model::RoutesSection>().Find(netstack_);
     return stack ? stack->ipv4ConfigGateway : Ipv4Address();
@@ -385,6 +556,7 @@ Ipv4Address RoutingInfoImpl::GetTarkonConfigDefaultGateway() {
 
 Ipv6Address RoutingInfoImpl::GetIpv6TarkonConfigDefaultGateway() {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetIpv6TarkonConfigDefaultGateway", netstack_);
+    if (auto* area = RealRouting()) return RealDefaultGateway<Ipv6Network, Ipv6Address>(*area, netstack_);
     RequireNetstack(netstack_);
     const auto* stack = Lib::Read<Model::RoutesSection>().Find(netstack_);
     return stack ? stack->ipv6ConfigGateway : Ipv6Address();
@@ -393,24 +565,34 @@ Ipv6Address RoutingInfoImpl::GetIpv6TarkonConfigDefaultGateway() {
 void RoutingInfoImpl::SetTarkonDefaultGateway(const Ipv4Address& gateway, bool fromDhcp) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::SetTarkonDefaultGateway", netstack_,
                Lib::Args(gateway.GetStringAddress(), fromDhcp));
+    if (auto* area = RealRouting()) {
+        if (fromDhcp) {
+            throw HostCtlException("A gateway learned by DHCP comes from the DHCP client of the " +
+                                   Lib::RealHost()->Describe() + "; it cannot be set");
+        }
+        return RealSetDefaultGateway<Ipv4Network>(*area, netstack_, gateway);
+    }
     SetDefaultGateway<Ipv4Network>(netstack_, gateway, fromDhcp);
 }
 
 void RoutingInfoImpl::SetIpv6TarkonDefaultGateway(const Ipv6Address& gateway) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::SetIpv6TarkonDefaultGateway", netstack_,
                gateway.GetStringAddress());
+    if (auto* area = RealRouting()) return RealSetDefaultGateway<Ipv6Network>(*area, netstack_, gateway);
     SetDefaultGateway<Ipv6Network>(netstack_, gateway, false);
 }
 
 void RoutingInfoImpl::GetCurrentIpv4TarkonNeighbors(std::vector<HostCtl::Network::Ipv4Neighbor>& out,
                                                     const std::string& interfaceName) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetCurrentIpv4TarkonNeighbors", netstack_, interfaceName);
+    if (auto* area = RealRouting()) return area->Neighbors(netstack_, out, interfaceName);
     GetNeighbors(netstack_, out, interfaceName);
 }
 
 void RoutingInfoImpl::GetCurrentIpv6TarkonNeighbors(std::vector<HostCtl::Network::Ipv6Neighbor>& out,
                                                     const std::string& interfaceName) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetCurrentIpv6TarkonNeighbors", netstack_, interfaceName);
+    if (auto* area = RealRouting()) return area->Neighbors(netstack_, out, interfaceName);
     RequireNetstack(netstack_);
     if (Ipv6On()) GetNeighbors(netstack_, out, interfaceName);
 }
@@ -418,18 +600,21 @@ void RoutingInfoImpl::GetCurrentIpv6TarkonNeighbors(std::vector<HostCtl::Network
 std::string RoutingInfoImpl::GetIpv4NeighborType(const HostCtl::Network::Ipv4Neighbor& neighbor) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetIpv4NeighborType", netstack_,
                Lib::Args(neighbor.address.GetStringAddress(), neighbor.interfaceName));
+    if (auto* area = RealRouting()) return area->NeighborType(netstack_, neighbor);
     return NeighborType(netstack_, neighbor);
 }
 
 std::string RoutingInfoImpl::GetIpv6NeighborType(const HostCtl::Network::Ipv6Neighbor& neighbor) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetIpv6NeighborType", netstack_,
                Lib::Args(neighbor.address.GetStringAddress(), neighbor.interfaceName));
+    if (auto* area = RealRouting()) return area->NeighborType(netstack_, neighbor);
     return NeighborType(netstack_, neighbor);
 }
 
 std::string RoutingInfoImpl::GetIpv6NeighborState(const HostCtl::Network::Ipv6Neighbor& neighbor) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::GetIpv6NeighborState", netstack_,
                Lib::Args(neighbor.address.GetStringAddress(), neighbor.interfaceName));
+    if (auto* area = RealRouting()) return area->NeighborState(neighbor);
     return neighbor.state < std::size(Model::kNeighborStateNames) ? Model::kNeighborStateNames[neighbor.state]
                                                                   : "Unknown";
 }
@@ -437,12 +622,14 @@ std::string RoutingInfoImpl::GetIpv6NeighborState(const HostCtl::Network::Ipv6Ne
 void RoutingInfoImpl::RemoveIpv4Neighbor(const HostCtl::Network::Ipv4Neighbor& neighbor) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::RemoveIpv4Neighbor", netstack_,
                Lib::Args(neighbor.address.GetStringAddress(), neighbor.interfaceName));
+    if (auto* area = RealRouting()) return area->RemoveNeighbor(netstack_, neighbor);
     RemoveNeighbor(netstack_, neighbor);
 }
 
 void RoutingInfoImpl::RemoveIpv6Neighbor(const HostCtl::Network::Ipv6Neighbor& neighbor) {
     Lib::Enter("TknCtl::Network::RoutingInfoImpl::RemoveIpv6Neighbor", netstack_,
                Lib::Args(neighbor.address.GetStringAddress(), neighbor.interfaceName));
+    if (auto* area = RealRouting()) return area->RemoveNeighbor(netstack_, neighbor);
     RemoveNeighbor(netstack_, neighbor);
 }
 

@@ -2,6 +2,8 @@
 #include <algorithm>
 #include <functional>
 
+#include "backend/host.h"
+#include "backend/interfaces.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -98,18 +100,27 @@ TarkonNicInfoImpl::~TarkonNicInfoImpl() = default;
 
 std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNics() {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNics");
+    if (auto* host = Lib::RealHost()) return Internal::RealTknNics(host->GetInterfaces().List({}));
     return Collect([](const Model::TknNic&) { return true; });
 }
 
 std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNicsByInstanceKey(
     const std::string& netstack) {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicsByInstanceKey", netstack);
+    if (auto* host = Lib::RealHost()) return Internal::RealTknNics(host->GetInterfaces().List(netstack));
     RequireNetstack(netstack);
     return Collect([&](const Model::TknNic& nic) { return nic.netstack == netstack; });
 }
 
 std::unique_ptr<TknNic> TarkonNicInfoImpl::GetTarkonNicByInterface(const std::string& name, bool mustExist) {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicByInterface", name, Lib::Args(mustExist));
+    if (auto* host = Lib::RealHost()) {
+        auto id = host->GetInterfaces().Find(name);
+        if (id) return std::make_unique<RealTknNic>(std::move(*id));
+        if (mustExist)
+            throw HostCtlException("Tarkon network interface " + Lib::Quote(name) + " does not exist");
+        return nullptr;
+    }
     if (!Lib::Read<Model::TknNicsSection>().Find(name)) {
         if (mustExist) Internal::FindTknNic(name);  // throws
         return nullptr;
@@ -120,6 +131,15 @@ std::unique_ptr<TknNic> TarkonNicInfoImpl::GetTarkonNicByInterface(const std::st
 std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNicsByTag(
     HostCtl::Network::TknNicTagType tag) {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicsByTag", {}, Lib::Args(tag));
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetInterfaces();
+        std::vector<Backend::InterfaceId> carrying;
+        for (auto& id : area.List({})) {
+            auto tags = area.GetTags(id);
+            if (std::find(tags.begin(), tags.end(), tag) != tags.end()) carrying.push_back(std::move(id));
+        }
+        return Internal::RealTknNics(carrying);
+    }
     return Collect([&](const Model::TknNic& nic) {
         return std::find(nic.tags.begin(), nic.tags.end(), tag) != nic.tags.end();
     });
@@ -128,6 +148,11 @@ std::vector<std::unique_ptr<TknNic>> TarkonNicInfoImpl::GetTarkonNicsByTag(
 void TarkonNicInfoImpl::GetTarkonNicNamesByInstanceKey(std::vector<std::string>& names,
                                                        const std::string& netstack) {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::GetTarkonNicNamesByInstanceKey", netstack);
+    if (auto* host = Lib::RealHost()) {
+        for (auto& id : host->GetInterfaces().List(netstack))
+            names.push_back(std::move(id.name));
+        return;
+    }
     RequireNetstack(netstack);
     for (const auto& nic : Lib::Read<Model::TknNicsSection>().nics) {
         if (nic.netstack == netstack) names.push_back(nic.name);
@@ -143,6 +168,10 @@ std::unique_ptr<TknNic> TarkonNicInfoImpl::AddTarkonNic(HostCtl::Network::Connec
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::AddTarkonNic", netstack,
                Lib::Args(name, mac.IsZero() ? std::string() : mac.GetStringAddress(), tsoMss, mtu, rxQueues));
     if (!connectionPoint) throw HostCtlException("A Tarkon network interface needs a connection point");
+    if (auto* host = Lib::RealHost()) {
+        return std::make_unique<RealTknNic>(
+            host->GetInterfaces().Add(*connectionPoint, netstack, config, mac, tsoMss, mtu, rxQueues, name));
+    }
 
     // Everything is checked before anything changes.
     Model::TknNic nic;
@@ -224,6 +253,7 @@ void TarkonNicInfoImpl::RemoveTarkonNic(HostCtl::Network::ConnectionPoint* conne
                                         const std::string& netstack) {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::RemoveTarkonNic", netstack);
     if (!connectionPoint) throw HostCtlException("No connection point given");
+    if (auto* host = Lib::RealHost()) return host->GetInterfaces().RemoveAt(*connectionPoint, netstack);
     Model::ConnectionPoint point = Internal::ToModelConnection(*connectionPoint);
     for (const auto& nic : Lib::Read<Model::TknNicsSection>().nics) {
         if (!Internal::SameConnection(nic.connection, point)) continue;

@@ -2,6 +2,7 @@
 // and taking a port of the switch behind one.
 #include <algorithm>
 
+#include "backend/host.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -22,12 +23,17 @@ using HostCtl::Network::ConnectionPoint;
 
 std::string PortGroupImpl::GetPortsetName() const {
     Lib::Enter("TknCtl::Network::PortGroupImpl::GetPortsetName", name_);
+    // A real host knows no port groups until it has standard switches of its own.
+    if (Lib::RealHost()) return {};
     const auto* vswitch = Lib::Read<Model::VSwitchesSection>().FindPortGroupSwitch(name_);
     return vswitch ? vswitch->name : std::string();
 }
 
 bool PortGroupImpl::IsValid() const {
     Lib::Enter("TknCtl::Network::PortGroupImpl::IsValid", name_);
+    // A real host judges a connection point when an interface is attached to it or taken from
+    // it (TarkonNicInfoImpl::AddTarkonNic, RemoveTarkonNic), where it can say why it cannot.
+    if (Lib::RealHost()) return true;
     return Lib::Read<Model::VSwitchesSection>().FindPortGroup(name_) != nullptr;
 }
 
@@ -66,6 +72,7 @@ std::string OpaqueNetworkImpl::GetPortsetName() const {
 
 bool OpaqueNetworkImpl::IsValid() const {
     Lib::Enter("TknCtl::Network::OpaqueNetworkImpl::IsValid", param_.GetNetworkId());
+    if (Lib::RealHost()) return false;  // a real host has no opaque networks
     const auto& nics = Lib::Read<Model::TknNicsSection>().nics;
     return std::any_of(nics.begin(), nics.end(), [&](const Model::TknNic& nic) {
         return nic.connection.type == Model::ConnectionPoint::kOpaque &&

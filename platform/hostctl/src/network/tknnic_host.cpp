@@ -58,73 +58,13 @@ const Model::TknNic* Ipv4Owner(const Model::TknNic& nic, const Ipv4Address& addr
 }
 
 void CheckStaticIpv4(const Model::TknNic& nic, const IpConfig& config) {
-    const Ipv4Address& address = config.GetIpv4Address();
-    const Ipv4Address& netmask = config.GetIpv4Netmask();
-    const Ipv4Address& gateway = config.GetIpv4Gateway();
-    if (address.IsUnspecified()) {
-        if (!netmask.IsUnspecified()) {
-            throw HostCtlException("IPv4 netmask " + netmask.GetStringAddress() +
-                                   " given without an IPv4 address");
-        }
-        if (!gateway.IsUnspecified()) {
-            throw HostCtlException("IPv4 gateway " + gateway.GetStringAddress() +
-                                   " given without an IPv4 address");
-        }
-        return;
-    }
-    if (const char* why = NotAHostAddress(address)) {
-        throw HostCtlException("IPv4 address " + address.GetStringAddress() +
-                               " cannot be assigned to an interface: " + why);
-    }
-    if (netmask.IsUnspecified() || !netmask.IsNetmask()) {
-        throw HostCtlException("Invalid IPv4 netmask " + netmask.GetStringAddress() +
-                               ": it must be a contiguous mask of 1 to 32 bits");
-    }
-    unsigned prefix = PrefixLength(netmask);
-    Ipv4Network subnet(Ipv4Network(address, prefix).GetNetwork(), prefix);
-    std::string subnetText = subnet.GetStringAddress();
-    if (prefix <= 30) {
-        if (address == subnet.GetAddress()) {
-            throw HostCtlException("IPv4 address " + address.GetStringAddress() +
-                                   " is the network address of " + subnetText);
-        }
-        if (address == config.GetIpv4Broadcast()) {
-            throw HostCtlException("IPv4 address " + address.GetStringAddress() +
-                                   " is the broadcast address of " + subnetText);
-        }
-    }
-    if (!gateway.IsUnspecified()) {
-        if (!subnet.Contains(gateway)) {
-            throw HostCtlException("IPv4 gateway " + gateway.GetStringAddress() + " is not on the subnet " +
-                                   subnetText + " of " + nic.name);
-        }
-        if (gateway == address) {
-            throw HostCtlException("IPv4 gateway " + gateway.GetStringAddress() +
-                                   " is the interface's own address");
-        }
-    }
-    if (const auto* owner = Ipv4Owner(nic, address)) {
-        throw HostCtlException("IPv4 address " + address.GetStringAddress() + " is already in use by " +
-                               owner->name + " on netstack " + Lib::Quote(nic.netstack));
-    }
+    Internal::CheckStaticIpv4(nic.name, nic.netstack, config, [&] {
+        const auto* owner = Ipv4Owner(nic, config.GetIpv4Address());
+        return owner ? owner->name : std::string();
+    });
 }
 
 // ---------------------------------------------------------------- IPv6
-
-bool IsMulticast(const Ipv6Address& address) {
-    return address.GetAddress().s6_addr[0] == 0xff;
-}
-
-bool IsLoopback(const Ipv6Address& address) {
-    static const Ipv6Address loopback("::1");
-    return address == loopback;
-}
-
-void CheckIpv6Unicast(const Ipv6Address& address, const std::string& what) {
-    if (address.IsUnspecified() || IsMulticast(address) || IsLoopback(address)) {
-        throw HostCtlException(what + " " + address.GetStringAddress() + " is not a unicast address");
-    }
-}
 
 // The interface identifier of a MAC address (modified EUI-64).
 void Eui64(const HostCtl::Network::MacAddress& mac, std::uint8_t out[8]) {
@@ -188,15 +128,7 @@ bool Ipv6InUseElsewhere(const Model::TknNic& nic, const Ipv6Address& address) {
 }
 
 void ApplyIpv6(const Model::TknNic& nic, const IpConfig& before, IpConfig& config) {
-    if (!config.GetIpv6Gateway().IsUnspecified()) CheckIpv6Unicast(config.GetIpv6Gateway(), "IPv6 gateway");
-    for (const auto& n : config.GetIpv6Network()) {
-        if (HasAddress(before, n.GetAddress())) continue;  // checked when it was added
-        CheckIpv6Unicast(n.GetAddress(), "IPv6 address");
-        if (n.GetNetmask() < 1 || n.GetNetmask() > 128) {
-            throw HostCtlException("IPv6 address " + n.GetStringAddress() +
-                                   " has an invalid prefix length: it must be between 1 and 128");
-        }
-    }
+    Internal::CheckIpv6(before, config);
 
     bool on = config.GetUseIpv6();
     bool wasOn = before.GetUseIpv6();
@@ -249,6 +181,90 @@ void ApplyIpv6(const Model::TknNic& nic, const IpConfig& before, IpConfig& confi
 }
 
 }  // namespace
+
+void CheckStaticIpv4(const std::string& name, const std::string& netstack, const IpConfig& config,
+                     const std::function<std::string()>& owner) {
+    const Ipv4Address& address = config.GetIpv4Address();
+    const Ipv4Address& netmask = config.GetIpv4Netmask();
+    const Ipv4Address& gateway = config.GetIpv4Gateway();
+    if (address.IsUnspecified()) {
+        if (!netmask.IsUnspecified()) {
+            throw HostCtlException("IPv4 netmask " + netmask.GetStringAddress() +
+                                   " given without an IPv4 address");
+        }
+        if (!gateway.IsUnspecified()) {
+            throw HostCtlException("IPv4 gateway " + gateway.GetStringAddress() +
+                                   " given without an IPv4 address");
+        }
+        return;
+    }
+    if (const char* why = NotAHostAddress(address)) {
+        throw HostCtlException("IPv4 address " + address.GetStringAddress() +
+                               " cannot be assigned to an interface: " + why);
+    }
+    if (netmask.IsUnspecified() || !netmask.IsNetmask()) {
+        throw HostCtlException("Invalid IPv4 netmask " + netmask.GetStringAddress() +
+                               ": it must be a contiguous mask of 1 to 32 bits");
+    }
+    unsigned prefix = PrefixLength(netmask);
+    Ipv4Network subnet(Ipv4Network(address, prefix).GetNetwork(), prefix);
+    std::string subnetText = subnet.GetStringAddress();
+    if (prefix <= 30) {
+        if (address == subnet.GetAddress()) {
+            throw HostCtlException("IPv4 address " + address.GetStringAddress() +
+                                   " is the network address of " + subnetText);
+        }
+        if (address == config.GetIpv4Broadcast()) {
+            throw HostCtlException("IPv4 address " + address.GetStringAddress() +
+                                   " is the broadcast address of " + subnetText);
+        }
+    }
+    if (!gateway.IsUnspecified()) {
+        if (!subnet.Contains(gateway)) {
+            throw HostCtlException("IPv4 gateway " + gateway.GetStringAddress() + " is not on the subnet " +
+                                   subnetText + " of " + name);
+        }
+        if (gateway == address) {
+            throw HostCtlException("IPv4 gateway " + gateway.GetStringAddress() +
+                                   " is the interface's own address");
+        }
+    }
+    if (std::string other = owner(); !other.empty()) {
+        throw HostCtlException("IPv4 address " + address.GetStringAddress() + " is already in use by " +
+                               other + " on netstack " + Lib::Quote(netstack));
+    }
+}
+
+namespace {
+
+bool IsMulticast(const Ipv6Address& address) {
+    return address.GetAddress().s6_addr[0] == 0xff;
+}
+
+bool IsLoopback(const Ipv6Address& address) {
+    static const Ipv6Address loopback("::1");
+    return address == loopback;
+}
+
+void CheckIpv6Unicast(const Ipv6Address& address, const std::string& what) {
+    if (address.IsUnspecified() || IsMulticast(address) || IsLoopback(address)) {
+        throw HostCtlException(what + " " + address.GetStringAddress() + " is not a unicast address");
+    }
+}
+
+}  // namespace
+
+void CheckIpv6(const IpConfig& before, const IpConfig& config) {
+    if (!config.GetIpv6Gateway().IsUnspecified()) CheckIpv6Unicast(config.GetIpv6Gateway(), "IPv6 gateway");
+    for (const auto& n : config.GetIpv6Network()) {
+        if (HasAddress(before, n.GetAddress())) continue;  // checked when it was added
+        CheckIpv6Unicast(n.GetAddress(), "IPv6 address");
+        if (n.GetNetmask() < 1 || n.GetNetmask() > 128) {
+            throw HostCtlException("IPv6 address " + n.GetStringAddress() +
+                                   " has an invalid prefix length: it must be between 1 and 128");
+        }
+    }
+}
 
 IpConfig CheckedIpConfig(const Model::TknNic& nic, const IpConfig* previous, IpConfig config) {
     const IpConfig none;

@@ -1,0 +1,183 @@
+#include "kernel/request.h"
+
+#include <arpa/inet.h>
+#include <linux/netlink.h>
+#include <netlink/msg.h>
+#include <netlink/netlink.h>
+#include <netlink/socket.h>
+#include <sys/socket.h>
+
+#include <cerrno>
+#include <cstring>
+#include <exception>
+#include <memory>
+
+#include "hostctl/exception.h"
+
+#ifndef SOL_NETLINK
+#define SOL_NETLINK 270
+#endif
+
+namespace TknCtl::Linux::Kernel {
+
+using HostCtl::Lib::HostCtlException;
+
+namespace {
+
+unsigned long g_generation = 0;
+
+struct MessageFree {
+    void operator()(nl_msg* message) const { nlmsg_free(message); }
+};
+struct CallbacksPut {
+    void operator()(nl_cb* cb) const { nl_cb_put(cb); }
+};
+using Callbacks = std::unique_ptr<nl_cb, CallbacksPut>;
+
+Callbacks CloneCallbacks(nl_sock* sock) {
+    Callbacks cb(nl_cb_clone(nl_socket_get_cb(sock)));
+    if (!cb) throw HostCtlException("out of memory");
+    return cb;
+}
+
+// Asks the kernel to explain its refusals (a socket option any kernel since 4.12 knows; an
+// older one simply gives no explanation).
+void AskForReasons(nl_sock* sock) {
+    int one = 1;
+    static_cast<void>(setsockopt(nl_socket_get_fd(sock), SOL_NETLINK, NETLINK_EXT_ACK, &one, sizeof(one)));
+}
+
+struct Waiting {
+    bool done = false;
+    Answer answer;
+};
+
+int OnError(sockaddr_nl*, nlmsgerr* error, void* arg) {
+    auto* waiting = static_cast<Waiting*>(arg);
+    // libnl hands the payload of the NLMSG_ERROR message; its header lies just before.
+    const auto* header =
+        reinterpret_cast<const nlmsghdr*>(reinterpret_cast<const char*>(error) - NLMSG_HDRLEN);
+    waiting->answer = ParseAnswer(header);
+    waiting->done = true;
+    return NL_STOP;
+}
+
+int OnAck(nl_msg*, void* arg) {
+    static_cast<Waiting*>(arg)->done = true;
+    return NL_STOP;
+}
+
+struct Dumping {
+    const std::function<void(nl_msg*)>* each = nullptr;
+    std::exception_ptr failure;
+};
+
+int OnMessage(nl_msg* message, void* arg) {
+    auto* dumping = static_cast<Dumping*>(arg);
+    // Nothing may be thrown through libnl's C frames: the first failure is kept and thrown
+    // once the whole reply is read (the socket then serves the next request).
+    if (dumping->failure) return NL_OK;
+    try {
+        (*dumping->each)(message);
+    } catch (...) {
+        dumping->failure = std::current_exception();
+    }
+    return NL_OK;
+}
+
+}  // namespace
+
+Answer ParseAnswer(const nlmsghdr* message) {
+    Answer answer;
+    if (message->nlmsg_len < NLMSG_LENGTH(sizeof(nlmsgerr))) {
+        answer.error = -EBADMSG;
+        return answer;
+    }
+    const auto* error = static_cast<const nlmsgerr*>(NLMSG_DATA(message));
+    answer.error = error->error;
+    if (!(message->nlmsg_flags & NLM_F_ACK_TLVS)) return answer;
+    // The extended attributes follow the error and the request it echoes (only the request's
+    // header when the kernel capped it).
+    std::size_t offset = NLMSG_HDRLEN + sizeof(nlmsgerr);
+    if (!(message->nlmsg_flags & NLM_F_CAPPED) && error->msg.nlmsg_len > NLMSG_HDRLEN)
+        offset += error->msg.nlmsg_len - NLMSG_HDRLEN;
+    offset = NLMSG_ALIGN(offset);
+    if (offset >= message->nlmsg_len) return answer;
+    auto* attrs =
+        reinterpret_cast<nlattr*>(const_cast<char*>(reinterpret_cast<const char*>(message) + offset));
+    int remaining = static_cast<int>(message->nlmsg_len - offset);
+    for (nlattr* attr = attrs; nla_ok(attr, remaining); attr = nla_next(attr, &remaining)) {
+        if (nla_type(attr) != NLMSGERR_ATTR_MSG) continue;
+        const char* text = static_cast<const char*>(nla_data(attr));
+        answer.reason.assign(text, strnlen(text, static_cast<std::size_t>(nla_len(attr))));
+    }
+    return answer;
+}
+
+std::string RefusalText(const Answer& answer) {
+    if (!answer.reason.empty()) return answer.reason;
+    return std::strerror(answer.error < 0 ? -answer.error : answer.error);
+}
+
+Answer TryRequest(const Namespace& ns, nl_msg* message) {
+    std::unique_ptr<nl_msg, MessageFree> owned(message);
+    nl_sock* sock = RouteSocket(ns);
+    AskForReasons(sock);
+    Changed();
+    Check(nl_send_auto(sock, message), "cannot send a request to the kernel");
+    Callbacks cb = CloneCallbacks(sock);
+    Waiting waiting;
+    nl_cb_err(cb.get(), NL_CB_CUSTOM, OnError, &waiting);
+    nl_cb_set(cb.get(), NL_CB_ACK, NL_CB_CUSTOM, OnAck, &waiting);
+    while (!waiting.done) {
+        int error = nl_recvmsgs(sock, cb.get());
+        if (error < 0 && !waiting.done) Check(error, "cannot read the kernel's answer");
+    }
+    return waiting.answer;
+}
+
+void Request(const Namespace& ns, nl_msg* message, const std::string& what) {
+    Answer answer = TryRequest(ns, message);
+    if (answer.error != 0) throw HostCtlException(what + ": " + RefusalText(answer));
+}
+
+void Dump(const Namespace& ns, int type, const void* header, std::size_t size,
+          const std::function<void()>& restart, const std::function<void(nl_msg*)>& each,
+          const std::string& what) {
+    nl_sock* sock = RouteSocket(ns);
+    for (int attempt = 0;; ++attempt) {
+        restart();
+        Check(nl_send_simple(sock, type, NLM_F_DUMP, const_cast<void*>(header), size), what);
+        Callbacks cb = CloneCallbacks(sock);
+        Dumping dumping{&each, nullptr};
+        nl_cb_set(cb.get(), NL_CB_VALID, NL_CB_CUSTOM, OnMessage, &dumping);
+        int error = nl_recvmsgs(sock, cb.get());
+        if (dumping.failure) std::rethrow_exception(dumping.failure);
+        // The table changed while the kernel was dumping it: what came is not consistent.
+        if (error == -NLE_DUMP_INTR && attempt < 8) continue;
+        Check(error, what);
+        return;
+    }
+}
+
+unsigned long Generation() {
+    return g_generation;
+}
+
+void Changed() {
+    ++g_generation;
+}
+
+std::string AddressText(int family, const void* bytes, std::size_t length) {
+    if (!((family == AF_INET && length >= 4) || (family == AF_INET6 && length >= 16))) return {};
+    char text[INET6_ADDRSTRLEN];
+    if (!inet_ntop(family, bytes, text, sizeof(text))) return {};
+    return text;
+}
+
+bool AddressBytes(int family, const std::string& text, unsigned char bytes[16]) {
+    std::memset(bytes, 0, 16);
+    return (family == AF_INET || family == AF_INET6) && inet_pton(family, text.c_str(), bytes) == 1;
+}
+
+}  // namespace TknCtl::Linux::Kernel

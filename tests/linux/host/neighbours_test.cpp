@@ -62,6 +62,8 @@ TEST_F(NeighboursTest, Ipv4EntriesAreTheKernelsWithTheirTypeAndWhatIsLeftOfTheir
     ASSERT_EQ(glidex.size(), 1u);
     EXPECT_EQ(glidex[0]["Neighbor"], "10.9.0.5");
     EXPECT_EQ(glidex[0]["Tknnic"], "g1");
+    // Listing keeps to its netstack: an interface of another one has no entries there.
+    EXPECT_TRUE(HadroJson("network ip neighbor list -v 4 -i g1").empty());
     EXPECT_EQ(Hadro("network ip neighbor list -v 4 -i nosuch").err,
               "Unable to find a Tarkon interface with the name nosuch\n");
     EXPECT_EQ(Hadro("network ip neighbor list -v 4 -N nowhere").err,

@@ -49,7 +49,7 @@ TEST(Addresses, AnIpv4AddressReadsWithItsBroadcastLabelAndLifetimes) {
     cache.ifa_valid = 300;
     cache.ifa_prefered = 150;
     nla_put(message.get(), IFA_CACHEINFO, sizeof(cache), &cache);
-    auto address = Kernel::ParseAddress(message.get());
+    auto address = Kernel::ParseAddress(nlmsg_hdr(message.get()));
     ASSERT_TRUE(address);
     EXPECT_EQ(address->family, AF_INET);
     EXPECT_EQ(address->index, 4);
@@ -65,17 +65,18 @@ TEST(Addresses, AnIpv4AddressReadsWithItsBroadcastLabelAndLifetimes) {
     EXPECT_TRUE(TknCtl::Linux::IsLeased(*address));
 
     // A point-to-point address: this end is IFA_LOCAL, the other IFA_ADDRESS.
-    auto peer =
-        Kernel::ParseAddress(AddressMessage(AF_INET, 32, IFA_F_PERMANENT, "10.9.0.1", "10.9.0.2").get());
+    auto peer = Kernel::ParseAddress(
+        nlmsg_hdr(AddressMessage(AF_INET, 32, IFA_F_PERMANENT, "10.9.0.1", "10.9.0.2").get()));
     EXPECT_EQ(peer->address, "10.9.0.1");
     EXPECT_EQ(peer->peer, "10.9.0.2");
     EXPECT_FALSE(TknCtl::Linux::IsLeased(*peer));
     // IPv6 gives IFA_ADDRESS alone; a message without an address, or of another kind, is none.
-    EXPECT_EQ(Kernel::ParseAddress(AddressMessage(AF_INET6, 64, 0, nullptr, "2001:db8::1").get())->address,
+    EXPECT_EQ(Kernel::ParseAddress(nlmsg_hdr(AddressMessage(AF_INET6, 64, 0, nullptr, "2001:db8::1").get()))
+                  ->address,
               "2001:db8::1");
-    EXPECT_FALSE(Kernel::ParseAddress(AddressMessage(AF_INET6, 64, 0, nullptr, nullptr).get()));
+    EXPECT_FALSE(Kernel::ParseAddress(nlmsg_hdr(AddressMessage(AF_INET6, 64, 0, nullptr, nullptr).get())));
     Message other(nlmsg_alloc_simple(RTM_NEWLINK, 0), nlmsg_free);
-    EXPECT_FALSE(Kernel::ParseAddress(other.get()));
+    EXPECT_FALSE(Kernel::ParseAddress(nlmsg_hdr(other.get())));
 }
 
 TEST(Addresses, ANewIpv4AddressGetsTheBroadcastOfItsSubnetAndADeleteNamesOnlyTheAddress) {
@@ -86,7 +87,7 @@ TEST(Addresses, ANewIpv4AddressGetsTheBroadcastOfItsSubnetAndADeleteNamesOnlyThe
     address.prefixLength = 26;
     Message add(Kernel::BuildAddressRequest(RTM_NEWADDR, address), nlmsg_free);
     EXPECT_EQ(nlmsg_hdr(add.get())->nlmsg_flags & (NLM_F_CREATE | NLM_F_EXCL), NLM_F_CREATE | NLM_F_EXCL);
-    auto built = Kernel::ParseAddress(add.get());
+    auto built = Kernel::ParseAddress(nlmsg_hdr(add.get()));
     ASSERT_TRUE(built);
     EXPECT_EQ(built->address, "192.0.2.10");
     EXPECT_EQ(built->prefixLength, 26u);
@@ -95,15 +96,15 @@ TEST(Addresses, ANewIpv4AddressGetsTheBroadcastOfItsSubnetAndADeleteNamesOnlyThe
 
     // /31 and /32 have no broadcast; IPv6 none either.
     address.prefixLength = 31;
-    EXPECT_EQ(
-        Kernel::ParseAddress(Message(Kernel::BuildAddressRequest(RTM_NEWADDR, address), nlmsg_free).get())
-            ->broadcast,
-        "");
+    EXPECT_EQ(Kernel::ParseAddress(
+                  nlmsg_hdr(Message(Kernel::BuildAddressRequest(RTM_NEWADDR, address), nlmsg_free).get()))
+                  ->broadcast,
+              "");
     address.prefixLength = 0;
-    EXPECT_EQ(
-        Kernel::ParseAddress(Message(Kernel::BuildAddressRequest(RTM_NEWADDR, address), nlmsg_free).get())
-            ->broadcast,
-        "255.255.255.255");
+    EXPECT_EQ(Kernel::ParseAddress(
+                  nlmsg_hdr(Message(Kernel::BuildAddressRequest(RTM_NEWADDR, address), nlmsg_free).get()))
+                  ->broadcast,
+              "255.255.255.255");
 
     address.prefixLength = 26;
     Message remove(Kernel::BuildAddressRequest(RTM_DELADDR, address), nlmsg_free);

@@ -2,6 +2,7 @@
 // to requests: messages built in memory.
 #include <gtest/gtest.h>
 #include <linux/if.h>
+#include <linux/if_link.h>
 #include <linux/ipv6.h>
 #include <linux/netlink.h>
 #include <linux/rtnetlink.h>
@@ -36,6 +37,17 @@ Message LinkMessage(int index, const char* name, const std::vector<std::int32_t>
     nla_put_u32(message.get(), IFLA_MTU, 9000);
     nla_put_u32(message.get(), IFLA_GSO_MAX_SIZE, 65536);
     nla_put_u32(message.get(), IFLA_NUM_RX_QUEUES, 4);
+    nla_put_u32(message.get(), IFLA_MASTER, 2);
+    nla_put_u8(message.get(), IFLA_OPERSTATE, 6);  // IF_OPER_UP
+    unsigned char mac[6] = {0x02, 0xab, 0x00, 0x00, 0x00, 0x0f};
+    nla_put(message.get(), IFLA_ADDRESS, 6, mac);
+    nlattr* linkinfo = nla_nest_start(message.get(), IFLA_LINKINFO);
+    nla_put_string(message.get(), IFLA_INFO_KIND, "veth");
+    nla_nest_end(message.get(), linkinfo);
+    rtnl_link_stats64 stats{};
+    stats.rx_packets = 11;
+    stats.tx_window_errors = 3;
+    nla_put(message.get(), IFLA_STATS64, sizeof(stats), &stats);
     if (!ipv6Conf.empty()) {
         nlattr* spec = nla_nest_start(message.get(), IFLA_AF_SPEC);
         nlattr* inet6 = nla_nest_start(message.get(), AF_INET6);
@@ -64,6 +76,12 @@ TEST(Links, ADeviceReadsWithItsOffloadQueuesAndIpv6Settings) {
     EXPECT_EQ(link->gsoMaxSize, 65536u);
     EXPECT_EQ(link->numRxQueues, 4u);
     EXPECT_TRUE(link->up);
+    EXPECT_EQ(link->kind, "veth");
+    EXPECT_EQ(link->mac, "02:ab:00:00:00:0f");
+    EXPECT_EQ(link->master, 2);
+    EXPECT_EQ(link->operState, "up");
+    EXPECT_EQ(link->stats.rxPackets, 11u);
+    EXPECT_EQ(link->stats.txWindowErrors, 3u);
     ASSERT_TRUE(link->ipv6);
     EXPECT_FALSE(link->ipv6->disabled);
     EXPECT_TRUE(link->ipv6->AcceptsRouterAdvertisements());

@@ -49,7 +49,7 @@ TEST(Neighbours, AnEntryReadsWithItsLinkLayerAddressAndAgesInSeconds) {
     cache.ndm_used = static_cast<std::uint32_t>(3 * tick + tick / 2);
     cache.ndm_updated = static_cast<std::uint32_t>(40 * tick);
     nla_put(message.get(), NDA_CACHEINFO, sizeof(cache), &cache);
-    auto entry = Kernel::ParseNeighbour(message.get());
+    auto entry = Kernel::ParseNeighbour(nlmsg_hdr(message.get()));
     ASSERT_TRUE(entry);
     EXPECT_EQ(entry->address, "fe80::1");
     EXPECT_EQ(entry->index, 3);
@@ -61,12 +61,15 @@ TEST(Neighbours, AnEntryReadsWithItsLinkLayerAddressAndAgesInSeconds) {
 
     // An unresolved entry has no link-layer address; the bridge's forwarding entries (AF_BRIDGE)
     // and entries without an address are none of the tables'.
-    auto unresolved = Kernel::ParseNeighbour(NeighbourMessage(AF_INET, "10.1.0.9", NUD_INCOMPLETE, 0).get());
+    auto unresolved =
+        Kernel::ParseNeighbour(nlmsg_hdr(NeighbourMessage(AF_INET, "10.1.0.9", NUD_INCOMPLETE, 0).get()));
     ASSERT_TRUE(unresolved);
     EXPECT_EQ(unresolved->linkLayer, "");
     EXPECT_EQ(TknCtl::Linux::NeighbourType(*unresolved), "Dynamic");
-    EXPECT_FALSE(Kernel::ParseNeighbour(NeighbourMessage(AF_BRIDGE, nullptr, NUD_PERMANENT, 0).get()));
-    EXPECT_FALSE(Kernel::ParseNeighbour(NeighbourMessage(AF_INET, nullptr, NUD_PERMANENT, 0).get()));
+    EXPECT_FALSE(
+        Kernel::ParseNeighbour(nlmsg_hdr(NeighbourMessage(AF_BRIDGE, nullptr, NUD_PERMANENT, 0).get())));
+    EXPECT_FALSE(
+        Kernel::ParseNeighbour(nlmsg_hdr(NeighbourMessage(AF_INET, nullptr, NUD_PERMANENT, 0).get())));
 }
 
 TEST(Neighbours, StateTypeAndExpiryFollowTheKernelsStateAndTimings) {
@@ -120,7 +123,7 @@ TEST(Neighbours, TimingsAreReadPerDeviceAndADeleteNamesTheEntry) {
     nla_put_u64(message.get(), NDTPA_GC_STALETIME, 60000);
     nla_put_u64(message.get(), NDTPA_DELAY_PROBE_TIME, 5000);
     nla_nest_end(message.get(), parms);
-    auto timing = Kernel::ParseNeighbourTiming(message.get());
+    auto timing = Kernel::ParseNeighbourTiming(nlmsg_hdr(message.get()));
     ASSERT_TRUE(timing);
     EXPECT_EQ(timing->family, AF_INET6);
     EXPECT_EQ(timing->index, 3);

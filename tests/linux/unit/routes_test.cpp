@@ -49,7 +49,7 @@ TEST(Routes, ARouteReadsWithItsNextHopTableAndMetric) {
     nla_put_u32(message.get(), RTA_PRIORITY, 100);
     nla_put_u32(message.get(), RTA_TABLE, 1000);  // beyond the 8 bits of rtm_table
     PutAddress(message.get(), RTA_PREFSRC, AF_INET, "10.1.0.1");
-    auto route = Kernel::ParseRoute(message.get());
+    auto route = Kernel::ParseRoute(nlmsg_hdr(message.get()));
     ASSERT_TRUE(route);
     EXPECT_EQ(route->destination, "10.2.0.0");
     EXPECT_EQ(route->prefixLength, 16u);
@@ -62,14 +62,14 @@ TEST(Routes, ARouteReadsWithItsNextHopTableAndMetric) {
     EXPECT_EQ(Kernel::DescribeRoute(*route), "10.2.0.0/16 via 10.1.0.2");
 
     // The default route has no destination attribute; a route of the kernel's cache is left out.
-    auto fallback = Kernel::ParseRoute(RouteMessage(AF_INET6, 0, nullptr).get());
+    auto fallback = Kernel::ParseRoute(nlmsg_hdr(RouteMessage(AF_INET6, 0, nullptr).get()));
     ASSERT_TRUE(fallback);
     EXPECT_EQ(fallback->destination, "::");
     EXPECT_TRUE(fallback->IsDefault());
     EXPECT_TRUE(fallback->nexthops.empty());
     EXPECT_EQ(Kernel::DescribeRoute(*fallback), "default");
-    EXPECT_FALSE(Kernel::ParseRoute(RouteMessage(AF_INET, 32, "10.2.0.9", RTM_F_CLONED).get()));
-    EXPECT_FALSE(Kernel::ParseRoute(RouteMessage(AF_BRIDGE, 0, nullptr).get()));
+    EXPECT_FALSE(Kernel::ParseRoute(nlmsg_hdr(RouteMessage(AF_INET, 32, "10.2.0.9", RTM_F_CLONED).get())));
+    EXPECT_FALSE(Kernel::ParseRoute(nlmsg_hdr(RouteMessage(AF_BRIDGE, 0, nullptr).get())));
 }
 
 TEST(Routes, AMultipathRouteReadsOneNextHopEach) {
@@ -91,7 +91,7 @@ TEST(Routes, AMultipathRouteReadsOneNextHopEach) {
         at += hop->rtnh_len;
     }
     nla_put(message.get(), RTA_MULTIPATH, static_cast<int>(at - buffer), buffer);
-    auto route = Kernel::ParseRoute(message.get());
+    auto route = Kernel::ParseRoute(nlmsg_hdr(message.get()));
     ASSERT_TRUE(route);
     EXPECT_EQ(route->nexthops, (std::vector<Kernel::Nexthop>{{"fe80::1", 5}, {"fe80::2", 6}}));
 }
@@ -107,7 +107,7 @@ TEST(Routes, AnAddIsExclusiveAndADeleteMatchesAnyScope) {
     nlmsghdr* header = nlmsg_hdr(add.get());
     EXPECT_EQ(header->nlmsg_flags & (NLM_F_CREATE | NLM_F_EXCL), NLM_F_CREATE | NLM_F_EXCL);
     // What is built reads back as it was meant (a new route as RTM_NEWROUTE).
-    auto back = Kernel::ParseRoute(add.get());
+    auto back = Kernel::ParseRoute(nlmsg_hdr(add.get()));
     ASSERT_TRUE(back);
     EXPECT_EQ(back->destination, "2001:db8:5::");
     EXPECT_EQ(back->prefixLength, 48u);

@@ -41,8 +41,8 @@ std::string DirectedBroadcast(const unsigned char bytes[16], unsigned prefixLeng
 
 }  // namespace
 
-std::optional<Address> ParseAddress(nl_msg* message) {
-    nlmsghdr* header = nlmsg_hdr(message);
+std::optional<Address> ParseAddress(const nlmsghdr* message) {
+    auto* header = const_cast<nlmsghdr*>(message);
     if (header->nlmsg_type != RTM_NEWADDR || !nlmsg_valid_hdr(header, sizeof(ifaddrmsg))) return std::nullopt;
     const auto* info = static_cast<const ifaddrmsg*>(nlmsg_data(header));
     nlattr* tb[IFA_MAX + 1] = {};
@@ -56,10 +56,12 @@ std::optional<Address> ParseAddress(nl_msg* message) {
     out.flags = tb[IFA_FLAGS] ? nla_get_u32(tb[IFA_FLAGS]) : info->ifa_flags;
     // IFA_LOCAL is the address of this end; IFA_ADDRESS the other end of a point-to-point link
     // (the same address on other links).
-    std::string local = AttrAddress(out.family, tb[IFA_LOCAL]);
-    std::string remote = AttrAddress(out.family, tb[IFA_ADDRESS]);
-    out.address = local.empty() ? remote : local;
-    if (!local.empty() && remote != local) out.peer = remote;
+    nlattr* local = tb[IFA_LOCAL];
+    nlattr* remote = tb[IFA_ADDRESS];
+    bool same = local && remote && nla_len(local) == nla_len(remote) &&
+                std::memcmp(nla_data(local), nla_data(remote), static_cast<std::size_t>(nla_len(local))) == 0;
+    out.address = AttrAddress(out.family, local ? local : remote);
+    if (local && remote && !same) out.peer = AttrAddress(out.family, remote);
     if (out.address.empty()) return std::nullopt;
     out.broadcast = AttrAddress(out.family, tb[IFA_BROADCAST]);
     if (tb[IFA_LABEL]) out.label = nla_get_string(tb[IFA_LABEL]);
@@ -78,7 +80,7 @@ std::vector<Address> ListAddresses(const Namespace& ns, int family) {
     header.ifa_family = static_cast<unsigned char>(family);
     Dump(
         ns, RTM_GETADDR, &header, sizeof(header), [&] { out.clear(); },
-        [&](nl_msg* message) {
+        [&](const nlmsghdr* message) {
             if (auto address = ParseAddress(message)) out.push_back(std::move(*address));
         },
         "cannot list the addresses");

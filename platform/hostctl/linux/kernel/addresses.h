@@ -10,6 +10,7 @@
 #include "kernel/netlink.h"
 
 struct nl_msg;
+struct nlmsghdr;
 
 namespace TknCtl::Linux::Kernel {
 
@@ -36,7 +37,7 @@ struct Address {
 std::vector<Address> ListAddresses(const Namespace& ns, int family);
 
 // A reply message (RTM_NEWADDR) read into a plain value; nothing when it is no address message.
-std::optional<Address> ParseAddress(nl_msg* message);
+std::optional<Address> ParseAddress(const nlmsghdr* message);
 
 // The request that adds (RTM_NEWADDR: a new address, refused when it exists) or deletes
 // (RTM_DELADDR) an address; the caller frees it with nlmsg_free (Request does). A new IPv4

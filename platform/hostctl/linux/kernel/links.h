@@ -11,6 +11,7 @@
 #include "kernel/netlink.h"
 
 struct nl_msg;
+struct nlmsghdr;
 struct rtnl_link;
 
 namespace TknCtl::Linux::Kernel {
@@ -79,6 +80,7 @@ void ChangeLink(const Namespace& ns, const std::string& name, const LinkChange& 
 Link LinkFromObject(rtnl_link* object);
 // A reply message (RTM_NEWLINK) reads into a plain value; nothing when it is no link message.
 std::optional<Link> ParseLink(nl_msg* message);
+std::optional<Link> ParseLink(const nlmsghdr* message);
 // The request (RTM_NEWLINK on the link's index) that makes a change; the caller frees it with
 // nlmsg_free. Throws HostCtlException for a change libnl cannot express (a malformed MAC).
 nl_msg* BuildLinkChange(int index, const LinkChange& change);

@@ -43,8 +43,8 @@ std::uint32_t Seconds(std::uint32_t ticks) {
 
 }  // namespace
 
-std::optional<Neighbour> ParseNeighbour(nl_msg* message) {
-    nlmsghdr* header = nlmsg_hdr(message);
+std::optional<Neighbour> ParseNeighbour(const nlmsghdr* message) {
+    auto* header = const_cast<nlmsghdr*>(message);
     if (header->nlmsg_type != RTM_NEWNEIGH || !nlmsg_valid_hdr(header, sizeof(ndmsg))) return std::nullopt;
     const auto* info = static_cast<const ndmsg*>(nlmsg_data(header));
     if (info->ndm_family != AF_INET && info->ndm_family != AF_INET6) return std::nullopt;
@@ -75,7 +75,7 @@ std::vector<Neighbour> ListNeighbours(const Namespace& ns, int family) {
     header.ndm_family = static_cast<unsigned char>(family);
     Dump(
         ns, RTM_GETNEIGH, &header, sizeof(header), [&] { out.clear(); },
-        [&](nl_msg* message) {
+        [&](const nlmsghdr* message) {
             if (auto neighbour = ParseNeighbour(message); neighbour && neighbour->family == family)
                 out.push_back(std::move(*neighbour));
         },
@@ -103,8 +103,8 @@ void DeleteNeighbour(const Namespace& ns, const Neighbour& neighbour, const std:
             "Cannot remove the neighbour entry of " + neighbour.address + " on " + device);
 }
 
-std::optional<NeighbourTiming> ParseNeighbourTiming(nl_msg* message) {
-    nlmsghdr* header = nlmsg_hdr(message);
+std::optional<NeighbourTiming> ParseNeighbourTiming(const nlmsghdr* message) {
+    auto* header = const_cast<nlmsghdr*>(message);
     if (header->nlmsg_type != RTM_NEWNEIGHTBL || !nlmsg_valid_hdr(header, sizeof(ndtmsg)))
         return std::nullopt;
     const auto* info = static_cast<const ndtmsg*>(nlmsg_data(header));
@@ -130,7 +130,7 @@ std::vector<NeighbourTiming> ListNeighbourTimings(const Namespace& ns) {
     header.ndtm_family = AF_UNSPEC;
     Dump(
         ns, RTM_GETNEIGHTBL, &header, sizeof(header), [&] { out.clear(); },
-        [&](nl_msg* message) {
+        [&](const nlmsghdr* message) {
             if (auto timing = ParseNeighbourTiming(message)) out.push_back(*timing);
         },
         "cannot read the neighbour tables' timings");

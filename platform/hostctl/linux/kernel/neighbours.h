@@ -11,6 +11,7 @@
 #include "kernel/netlink.h"
 
 struct nl_msg;
+struct nlmsghdr;
 
 namespace TknCtl::Linux::Kernel {
 
@@ -30,7 +31,7 @@ std::vector<Neighbour> ListNeighbours(const Namespace& ns, int family);
 
 // A reply message (RTM_NEWNEIGH) read into a plain value; nothing when it is none, or an
 // entry of another family (the bridge's forwarding database comes as AF_BRIDGE).
-std::optional<Neighbour> ParseNeighbour(nl_msg* message);
+std::optional<Neighbour> ParseNeighbour(const nlmsghdr* message);
 
 // The request that deletes the entry (its family, device and address); the caller frees it
 // with nlmsg_free (Request does). Throws HostCtlException for an address not of its family.
@@ -49,6 +50,6 @@ struct NeighbourTiming {
 // The timings of every device's tables, and the tables' defaults.
 std::vector<NeighbourTiming> ListNeighbourTimings(const Namespace& ns);
 // A reply message (RTM_NEWNEIGHTBL) read into a plain value; nothing when it holds no timings.
-std::optional<NeighbourTiming> ParseNeighbourTiming(nl_msg* message);
+std::optional<NeighbourTiming> ParseNeighbourTiming(const nlmsghdr* message);
 
 }  // namespace TknCtl::Linux::Kernel

@@ -6,11 +6,15 @@
 #include <netlink/netlink.h>
 #include <netlink/socket.h>
 #include <sys/socket.h>
+#include <sys/uio.h>
+#include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 #include <exception>
 #include <memory>
+#include <vector>
 
 #include "hostctl/exception.h"
 
@@ -65,24 +69,6 @@ int OnError(sockaddr_nl*, nlmsgerr* error, void* arg) {
 int OnAck(nl_msg*, void* arg) {
     static_cast<Waiting*>(arg)->done = true;
     return NL_STOP;
-}
-
-struct Dumping {
-    const std::function<void(nl_msg*)>* each = nullptr;
-    std::exception_ptr failure;
-};
-
-int OnMessage(nl_msg* message, void* arg) {
-    auto* dumping = static_cast<Dumping*>(arg);
-    // Nothing may be thrown through libnl's C frames: the first failure is kept and thrown
-    // once the whole reply is read (the socket then serves the next request).
-    if (dumping->failure) return NL_OK;
-    try {
-        (*dumping->each)(message);
-    } catch (...) {
-        dumping->failure = std::current_exception();
-    }
-    return NL_OK;
 }
 
 }  // namespace
@@ -141,21 +127,97 @@ void Request(const Namespace& ns, nl_msg* message, const std::string& what) {
     if (answer.error != 0) throw HostCtlException(what + ": " + RefusalText(answer));
 }
 
+namespace {
+
+// A netlink socket of its own for each dump, opened in the namespace and closed after: its
+// replies are read here, message by message, which leaves the shared socket's sequence of
+// requests and answers to libnl (and keeps no namespace alive once the dump is done).
+class DumpSocket {
+public:
+    explicit DumpSocket(const Namespace& ns) {
+        int error = 0;
+        ns.Run([&] {
+            fd_ = socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE);
+            error = errno;
+        });
+        if (fd_ < 0) {
+            throw HostCtlException("cannot open a netlink socket" +
+                                   (ns.IsOwn() ? std::string() : " in namespace " + ns.Name()) + ": " +
+                                   std::strerror(error));
+        }
+        int one = 1;
+        static_cast<void>(setsockopt(fd_, SOL_NETLINK, NETLINK_EXT_ACK, &one, sizeof(one)));
+    }
+    ~DumpSocket() { close(fd_); }
+    DumpSocket(const DumpSocket&) = delete;
+    DumpSocket& operator=(const DumpSocket&) = delete;
+    int Fd() const { return fd_; }
+
+private:
+    int fd_ = -1;
+};
+
+}  // namespace
+
 void Dump(const Namespace& ns, int type, const void* header, std::size_t size,
-          const std::function<void()>& restart, const std::function<void(nl_msg*)>& each,
+          const std::function<void()>& restart, const std::function<void(const nlmsghdr*)>& each,
           const std::string& what) {
-    nl_sock* sock = RouteSocket(ns);
-    for (int attempt = 0;; ++attempt) {
+    DumpSocket sock(ns);
+    // A dump comes in messages of at most 32 KiB (the kernel's bound for a reader's buffer).
+    std::vector<char> buffer(64 * 1024);
+    for (unsigned sequence = 1;; ++sequence) {
         restart();
-        Check(nl_send_simple(sock, type, NLM_F_DUMP, const_cast<void*>(header), size), what);
-        Callbacks cb = CloneCallbacks(sock);
-        Dumping dumping{&each, nullptr};
-        nl_cb_set(cb.get(), NL_CB_VALID, NL_CB_CUSTOM, OnMessage, &dumping);
-        int error = nl_recvmsgs(sock, cb.get());
-        if (dumping.failure) std::rethrow_exception(dumping.failure);
+        std::vector<char> request(NLMSG_SPACE(size));
+        auto* message = reinterpret_cast<nlmsghdr*>(request.data());
+        message->nlmsg_len = static_cast<unsigned>(NLMSG_LENGTH(size));
+        message->nlmsg_type = static_cast<unsigned short>(type);
+        message->nlmsg_flags = NLM_F_REQUEST | NLM_F_DUMP;
+        message->nlmsg_seq = sequence;
+        std::memcpy(NLMSG_DATA(message), header, size);
+        sockaddr_nl kernel{};
+        kernel.nl_family = AF_NETLINK;
+        if (sendto(sock.Fd(), request.data(), message->nlmsg_len, 0, reinterpret_cast<sockaddr*>(&kernel),
+                   sizeof(kernel)) < 0)
+            throw HostCtlException(what + ": " + std::strerror(errno));
+
+        std::exception_ptr failure;
+        bool interrupted = false;
+        for (bool done = false; !done;) {
+            iovec part{buffer.data(), buffer.size()};
+            msghdr received{};
+            received.msg_iov = &part;
+            received.msg_iovlen = 1;
+            ssize_t length = recvmsg(sock.Fd(), &received, 0);
+            if (length < 0 && errno == EINTR) continue;
+            if (length < 0) throw HostCtlException(what + ": " + std::strerror(errno));
+            if (received.msg_flags & MSG_TRUNC)
+                throw HostCtlException(what + ": a reply was too long to read");
+            int remaining = static_cast<int>(length);
+            for (auto* reply = reinterpret_cast<nlmsghdr*>(buffer.data()); NLMSG_OK(reply, remaining);
+                 reply = NLMSG_NEXT(reply, remaining)) {
+                if (reply->nlmsg_seq != sequence) continue;  // what is left of an abandoned dump
+                if (reply->nlmsg_flags & NLM_F_DUMP_INTR) interrupted = true;
+                if (reply->nlmsg_type == NLMSG_DONE) {
+                    done = true;
+                    break;
+                }
+                if (reply->nlmsg_type == NLMSG_ERROR) {
+                    Answer answer = ParseAnswer(reply);
+                    if (answer.error != 0) throw HostCtlException(what + ": " + RefusalText(answer));
+                    continue;
+                }
+                if (reply->nlmsg_type < NLMSG_MIN_TYPE || failure) continue;
+                // The first failure is kept and thrown once the whole reply is read.
+                try {
+                    each(reply);
+                } catch (...) {
+                    failure = std::current_exception();
+                }
+            }
+        }
+        if (failure) std::rethrow_exception(failure);
         // The table changed while the kernel was dumping it: what came is not consistent.
-        if (error == -NLE_DUMP_INTR && attempt < 8) continue;
-        Check(error, what);
+        if (interrupted && sequence < 8) continue;
         return;
     }
 }

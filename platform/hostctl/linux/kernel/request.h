@@ -42,7 +42,7 @@ Answer ParseAnswer(const nlmsghdr* message);
 // table changed meanwhile is made again, after restart() (which forgets what each gathered).
 // Throws HostCtlException(what + ": " + the reason) when the kernel refuses the dump.
 void Dump(const Namespace& ns, int type, const void* header, std::size_t size,
-          const std::function<void()>& restart, const std::function<void(nl_msg*)>& each,
+          const std::function<void()>& restart, const std::function<void(const nlmsghdr*)>& each,
           const std::string& what);
 
 // Changes made to the kernel by this process, counted: what was read of the kernel before a

@@ -55,8 +55,8 @@ std::string DescribeRoute(const Route& route) {
     return text;
 }
 
-std::optional<Route> ParseRoute(nl_msg* message) {
-    nlmsghdr* header = nlmsg_hdr(message);
+std::optional<Route> ParseRoute(const nlmsghdr* message) {
+    auto* header = const_cast<nlmsghdr*>(message);
     if (header->nlmsg_type != RTM_NEWROUTE || !nlmsg_valid_hdr(header, sizeof(rtmsg))) return std::nullopt;
     const auto* info = static_cast<const rtmsg*>(nlmsg_data(header));
     if (info->rtm_flags & RTM_F_CLONED) return std::nullopt;
@@ -86,13 +86,22 @@ std::optional<Route> ParseRoute(nl_msg* message) {
     return out;
 }
 
-std::vector<Route> ListRoutes(const Namespace& ns, int family) {
+std::vector<Route> ListRoutes(const Namespace& ns, int family, unsigned table, bool defaultsOnly) {
     std::vector<Route> out;
     rtmsg header{};
     header.rtm_family = static_cast<unsigned char>(family);
     Dump(
         ns, RTM_GETROUTE, &header, sizeof(header), [&] { out.clear(); },
-        [&](nl_msg* message) {
+        [&](const nlmsghdr* message) {
+            // What is not wanted is told by the header and one attribute.
+            auto* reply = const_cast<nlmsghdr*>(message);
+            if (reply->nlmsg_type != RTM_NEWROUTE || !nlmsg_valid_hdr(reply, sizeof(rtmsg))) return;
+            const auto* info = static_cast<const rtmsg*>(nlmsg_data(reply));
+            if (defaultsOnly && info->rtm_dst_len != 0) return;
+            if (table != 0) {
+                nlattr* attr = nlmsg_find_attr(reply, sizeof(rtmsg), RTA_TABLE);
+                if ((attr ? nla_get_u32(attr) : info->rtm_table) != table) return;
+            }
             if (auto route = ParseRoute(message)) out.push_back(std::move(*route));
         },
         "cannot list the routes");

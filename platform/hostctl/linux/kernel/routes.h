@@ -10,6 +10,7 @@
 #include "kernel/netlink.h"
 
 struct nl_msg;
+struct nlmsghdr;
 
 namespace TknCtl::Linux::Kernel {
 
@@ -38,12 +39,14 @@ struct Route {
     bool IsDefault() const { return prefixLength == 0; }
 };
 
-// The routes of a namespace (family AF_INET or AF_INET6), of every table, in the kernel's order.
-std::vector<Route> ListRoutes(const Namespace& ns, int family);
+// The routes of a namespace (family AF_INET or AF_INET6), in the kernel's order: of one table,
+// or of every table (table 0); only the default routes when defaultsOnly is set (the others are
+// not read further than their header).
+std::vector<Route> ListRoutes(const Namespace& ns, int family, unsigned table = 0, bool defaultsOnly = false);
 
 // A reply message (RTM_NEWROUTE) read into a plain value; nothing when it is no route message
 // or a route of the kernel's cache.
-std::optional<Route> ParseRoute(nl_msg* message);
+std::optional<Route> ParseRoute(const nlmsghdr* message);
 
 // The request that adds (RTM_NEWROUTE, refused when a route of the same destination and metric
 // exists) or deletes (RTM_DELROUTE: the route of that destination, metric and next hop) a

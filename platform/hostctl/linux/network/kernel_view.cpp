@@ -67,9 +67,13 @@ void NetstackView::Fresh() {
     if (generation_ == Kernel::Generation()) return;
     generation_ = Kernel::Generation();
     links_.reset();
+    byName_.reset();
     addresses_.reset();
+    addressesByIndex_.reset();
     routes4_.reset();
     routes6_.reset();
+    defaults4_.reset();
+    defaults6_.reset();
     neighbours4_.reset();
     neighbours6_.reset();
     timings_.reset();
@@ -90,26 +94,36 @@ const Kernel::Link* NetstackView::LinkByIndex(int index) {
     return it != links.end() && it->index == index ? &*it : nullptr;
 }
 
+void NetstackView::IndexLinks() {
+    const auto& links = Links();
+    if (byName_) return;
+    byName_.emplace();
+    byName_->reserve(links.size());
+    for (std::size_t i = 0; i < links.size(); ++i)
+        (*byName_)[links[i].name] = {i, IsIpInterface(links[i], links)};
+}
+
 const Kernel::Link* NetstackView::LinkByName(const std::string& name) {
-    for (const auto& link : Links()) {
-        if (link.name == name) return &link;
-    }
-    return nullptr;
+    IndexLinks();
+    auto it = byName_->find(name);
+    return it == byName_->end() ? nullptr : &(*links_)[it->second.position];
 }
 
 std::vector<const Kernel::Link*> NetstackView::IpInterfaces() {
-    const auto& links = Links();
+    IndexLinks();
+    const auto& links = *links_;
     std::vector<const Kernel::Link*> out;
     out.reserve(links.size());
     for (const auto& link : links) {
-        if (IsIpInterface(link, links)) out.push_back(&link);
+        if (byName_->at(link.name).ipInterface) out.push_back(&link);
     }
     return out;
 }
 
 const Kernel::Link* NetstackView::IpInterface(const std::string& name) {
-    const auto* link = LinkByName(name);
-    return link && IsIpInterface(*link, Links()) ? link : nullptr;
+    IndexLinks();
+    auto it = byName_->find(name);
+    return it == byName_->end() || !it->second.ipInterface ? nullptr : &(*links_)[it->second.position];
 }
 
 std::string NetstackView::NameOf(int index) {
@@ -123,14 +137,44 @@ const std::vector<Kernel::Address>& NetstackView::Addresses() {
     return *addresses_;
 }
 
+std::vector<const Kernel::Address*> NetstackView::AddressesOf(int index) {
+    const auto& addresses = Addresses();
+    if (!addressesByIndex_) {
+        addressesByIndex_.emplace();
+        for (std::size_t i = 0; i < addresses.size(); ++i)
+            (*addressesByIndex_)[addresses[i].index].push_back(i);
+    }
+    std::vector<const Kernel::Address*> out;
+    if (auto it = addressesByIndex_->find(index); it != addressesByIndex_->end()) {
+        out.reserve(it->second.size());
+        for (std::size_t i : it->second)
+            out.push_back(&addresses[i]);
+    }
+    return out;
+}
+
 const std::vector<Kernel::Route>& NetstackView::MainRoutes(int family) {
     Fresh();
     auto& routes = family == AF_INET ? routes4_ : routes6_;
-    if (!routes) {
-        routes = Kernel::ListRoutes(ns_, family);
-        std::erase_if(*routes, [](const Kernel::Route& r) { return r.table != Kernel::kMainTable; });
-    }
+    if (!routes) routes = Kernel::ListRoutes(ns_, family, Kernel::kMainTable);
     return *routes;
+}
+
+const std::vector<Kernel::Route>& NetstackView::DefaultRoutes(int family) {
+    Fresh();
+    auto& defaults = family == AF_INET ? defaults4_ : defaults6_;
+    if (!defaults) {
+        const auto& all = family == AF_INET ? routes4_ : routes6_;
+        if (all) {
+            defaults.emplace();
+            for (const auto& route : *all) {
+                if (route.IsDefault()) defaults->push_back(route);
+            }
+        } else {
+            defaults = Kernel::ListRoutes(ns_, family, Kernel::kMainTable, true);
+        }
+    }
+    return *defaults;
 }
 
 const std::vector<Kernel::Neighbour>& NetstackView::Neighbours(int family) {

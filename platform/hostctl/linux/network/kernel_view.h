@@ -10,6 +10,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <unordered_map>
 #include <vector>
 
 #include "kernel/addresses.h"
@@ -62,10 +63,12 @@ public:
     // The name of the device of that index; empty when there is none.
     std::string NameOf(int index);
 
-    // Both families, in the kernel's order.
+    // Both families, in the kernel's order; those of one device.
     const std::vector<Kernel::Address>& Addresses();
-    // The routes of the main table of a family.
+    std::vector<const Kernel::Address*> AddressesOf(int index);
+    // The routes of the main table of a family, and its default routes alone.
     const std::vector<Kernel::Route>& MainRoutes(int family);
+    const std::vector<Kernel::Route>& DefaultRoutes(int family);
     const std::vector<Kernel::Neighbour>& Neighbours(int family);
     // The timings of a device's neighbour table of a family (the table's defaults when the
     // device has none of its own).
@@ -74,13 +77,22 @@ public:
 
 private:
     void Fresh();
+    // The names and kinds of the links, looked up by name in constant time.
+    void IndexLinks();
+
+    struct LinkEntry {
+        std::size_t position = 0;
+        bool ipInterface = false;
+    };
 
     std::string netstack_;
     Kernel::Namespace ns_;
     unsigned long generation_ = 0;
     std::optional<std::vector<Kernel::Link>> links_;
+    std::optional<std::unordered_map<std::string, LinkEntry>> byName_;
     std::optional<std::vector<Kernel::Address>> addresses_;
-    std::optional<std::vector<Kernel::Route>> routes4_, routes6_;
+    std::optional<std::unordered_map<int, std::vector<std::size_t>>> addressesByIndex_;
+    std::optional<std::vector<Kernel::Route>> routes4_, routes6_, defaults4_, defaults6_;
     std::optional<std::vector<Kernel::Neighbour>> neighbours4_, neighbours6_;
     std::optional<std::vector<Kernel::NeighbourTiming>> timings_;
     std::optional<std::vector<Kernel::Membership>> memberships_;

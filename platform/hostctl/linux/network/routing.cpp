@@ -205,14 +205,13 @@ public:
             sources.bySubnet.clear();
             for (const auto& route : view.MainRoutes(AF_INET)) {
                 if (route.type != RTN_UNICAST) continue;
-                sources.bySubnet.emplace(route.destination + "/" + std::to_string(route.prefixLength),
+                sources.bySubnet.emplace(SubnetKey(Ipv4Address(route.destination), route.prefixLength),
                                          RouteSource(route.protocol));
             }
             sources.generation = Kernel::Generation();
             sources.filled = true;
         }
-        auto it = sources.bySubnet.find(network.GetNetwork().GetStringAddress() + "/" +
-                                        std::to_string(network.GetPrefixLength()));
+        auto it = sources.bySubnet.find(SubnetKey(network.GetNetwork(), network.GetPrefixLength()));
         return it == sources.bySubnet.end() ? std::string() : it->second;
     }
 
@@ -380,7 +379,10 @@ private:
     template <class Make>
     void Collect(const std::string& netstack, int family, const std::string& interfaceName, Make make) {
         auto& view = views_.Of(netstack);
-        int only = interfaceName.empty() ? 0 : IndexOf(view, interfaceName);
+        // An interface of another netstack has no entries in this one.
+        const auto* link = interfaceName.empty() ? nullptr : view.IpInterface(interfaceName);
+        if (!interfaceName.empty() && !link) return;
+        int only = link ? link->index : 0;
         for (const auto& entry : view.Neighbours(family)) {
             if (only != 0 && entry.index != only) continue;
             const auto* link = view.LinkByIndex(entry.index);
@@ -411,6 +413,10 @@ private:
         return it->second;
     }
 
+    static std::uint64_t SubnetKey(const Ipv4Address& network, unsigned prefix) {
+        return (std::uint64_t(network.GetHostOrder()) << 8) | prefix;
+    }
+
     static std::string Key(int family, const std::string& name, const std::string& address) {
         return std::to_string(family) + " " + name + " " + address;
     }
@@ -418,7 +424,9 @@ private:
     void RemoveEntries(const std::string& netstack, int family, const std::string& address,
                        const std::string& interfaceName) {
         auto& view = views_.Of(netstack);
-        int only = interfaceName.empty() ? 0 : IndexOf(view, interfaceName);
+        const auto* link = interfaceName.empty() ? nullptr : view.IpInterface(interfaceName);
+        int only = link ? link->index : -1;  // an interface of another netstack: none of this one's
+        if (interfaceName.empty()) only = 0;
         std::vector<std::pair<Kernel::Neighbour, std::string>> matches;
         for (const auto& entry : view.Neighbours(family)) {
             if (entry.address != address || (only != 0 && entry.index != only)) continue;
@@ -448,7 +456,7 @@ private:
     struct Sources {
         unsigned long generation = 0;
         bool filled = false;
-        std::unordered_map<std::string, std::string> bySubnet;
+        std::unordered_map<std::uint64_t, std::string> bySubnet;
     };
     struct Types {
         unsigned long generation = 0;

@@ -31,6 +31,7 @@
 #include <climits>
 #include <memory>
 #include <nlohmann/json.hpp>
+#include <unordered_map>
 
 #include "backend/interfaces.h"
 #include "core/context.h"
@@ -176,6 +177,16 @@ public:
     }
 
     IpConfig GetIpConfig(const InterfaceId& id) override {
+        // A listing asks twice for each interface (its configuration, and the one in force).
+        std::string key = id.netstack + '\n' + id.name;
+        if (auto it = configs_.find(key); it != configs_.end() && it->second.first == Kernel::Generation())
+            return it->second.second;
+        IpConfig config = ReadIpConfig(id);
+        configs_[key] = {Kernel::Generation(), config};
+        return config;
+    }
+
+    IpConfig ReadIpConfig(const InterfaceId& id) {
         auto& view = View(id);
         const Kernel::Link& link = Require(id);
         int index = link.index;
@@ -188,18 +199,18 @@ public:
             config.SetIpv4Address(Ipv4Address(ipv4->address));
             config.SetIpv4Netmask(Ipv4Network::NetmaskFromNumber(ipv4->prefixLength));
             if (IsLeased(*ipv4)) config.SetUseDhcp(true);
-            if (const auto* route = DefaultThrough(view.MainRoutes(AF_INET), index))
+            if (const auto* route = DefaultThrough(view.DefaultRoutes(AF_INET), index))
                 config.SetIpv4Gateway(Ipv4Address(route->nexthops.front().gateway));
         }
 
         bool leasedIpv6 = false;
         std::vector<Ipv6Network> networks;
-        for (const auto& address : view.Addresses()) {
-            if (address.family != AF_INET6 || address.index != index) continue;
-            int origin = Ipv6Origin(address);
+        for (const auto* address : view.AddressesOf(index)) {
+            if (address->family != AF_INET6) continue;
+            int origin = Ipv6Origin(*address);
             leasedIpv6 = leasedIpv6 || origin == Ipv6Network::ORIGIN_DHCP;
-            networks.emplace_back(Ipv6Address(address.address), address.prefixLength, origin,
-                                  Ipv6Status(address));
+            networks.emplace_back(Ipv6Address(address->address), address->prefixLength, origin,
+                                  Ipv6Status(*address));
         }
         config.SetIpv6Networks(std::move(networks));
         // Refresh() of `link` is not needed: the tables above were read at one generation.
@@ -207,7 +218,7 @@ public:
         config.SetUseIpv6(current.ipv6 && !current.ipv6->disabled);
         config.SetUseIpv6RouterAdvertised(current.ipv6 && current.ipv6->AcceptsRouterAdvertisements());
         config.SetUseIpv6Dhcp(leasedIpv6);
-        if (const auto* route = DefaultThrough(view.MainRoutes(AF_INET6), index))
+        if (const auto* route = DefaultThrough(view.DefaultRoutes(AF_INET6), index))
             config.SetIpv6Gateway(Ipv6Address(route->nexthops.front().gateway));
         return config;
     }
@@ -341,18 +352,18 @@ private:
     // The first IPv4 address of the device: its first primary one, else its first.
     static const Kernel::Address* FirstIpv4(NetstackView& view, int index) {
         const Kernel::Address* first = nullptr;
-        for (const auto& address : view.Addresses()) {
-            if (address.family != AF_INET || address.index != index) continue;
-            if (!(address.flags & IFA_F_SECONDARY)) return &address;
-            if (!first) first = &address;
+        for (const auto* address : view.AddressesOf(index)) {
+            if (address->family != AF_INET) continue;
+            if (!(address->flags & IFA_F_SECONDARY)) return address;
+            if (!first) first = address;
         }
         return first;
     }
 
     static std::vector<Kernel::Address> AddressesOf(NetstackView& view, int family, int index) {
         std::vector<Kernel::Address> out;
-        for (const auto& address : view.Addresses()) {
-            if (address.family == family && address.index == index) out.push_back(address);
+        for (const auto* address : view.AddressesOf(index)) {
+            if (address->family == family) out.push_back(*address);
         }
         return out;
     }
@@ -436,7 +447,7 @@ private:
         auto check = [&](int family, const std::string& gateway, const std::string& currentGateway,
                          const char* what) {
             if (gateway.empty() || gateway == currentGateway) return;
-            for (const auto& route : view.MainRoutes(family)) {
+            for (const auto& route : view.DefaultRoutes(family)) {
                 if (!route.IsDefault() || route.type != RTN_UNICAST || route.metric != DefaultMetric(family))
                     continue;
                 if (route.nexthops.size() == 1 && route.nexthops.front().index == index) continue;
@@ -467,7 +478,7 @@ private:
         if (!wanted.GetUseIpv6()) return false;  // the kernel takes the routes of a device without IPv6
         if (!wanted.GetIpv6Gateway().IsUnspecified() || !Dynamic6(wanted))
             return wanted.GetIpv6Gateway() != current.GetIpv6Gateway();
-        return DefaultThrough(View(id).MainRoutes(AF_INET6), Require(id).index, false) != nullptr;
+        return DefaultThrough(View(id).DefaultRoutes(AF_INET6), Require(id).index, false) != nullptr;
     }
 
     bool Differ(const InterfaceId& id, const IpConfig& current, const IpConfig& wanted) {
@@ -619,7 +630,7 @@ private:
         const auto ns = view.Namespace();
         int index = Require(id).index;
         std::vector<Kernel::Route> through;
-        for (const auto& route : view.MainRoutes(family)) {
+        for (const auto& route : view.DefaultRoutes(family)) {
             if (!route.IsDefault() || route.type != RTN_UNICAST || route.nexthops.size() != 1 ||
                 route.nexthops.front().index != index)
                 continue;
@@ -741,6 +752,7 @@ private:
 
     Context& context_;
     KernelViews views_;
+    std::unordered_map<std::string, std::pair<unsigned long, IpConfig>> configs_;
 };
 
 }  // namespace

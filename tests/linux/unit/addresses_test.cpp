@@ -158,4 +158,47 @@ TEST(Addresses, AnIpv6AddressIsStaticAutoconfiguredOrLeasedAndHasAState) {
     EXPECT_EQ(Ipv6Status(make("2001:db8::1", 64, IFA_F_PERMANENT, 0, 0)), Ipv6Network::STATUS_PREFERRED);
 }
 
+TEST(Addresses, AChangeIsReadBackAndWhatTheKernelDoesNotHoldIsNamed) {
+    using HostCtl::Network::IpConfig;
+    using HostCtl::Network::Ipv4Address;
+    using TknCtl::Linux::ConfigDifference;
+    IpConfig before;
+    before.SetUseIpv6(true);
+    before.AddIpv6Network(Ipv6Network("2001:db8::1/64"));
+    IpConfig wanted = before;
+    wanted.SetIpv4Address(Ipv4Address("10.0.0.5"));
+    wanted.SetIpv4Netmask(Ipv4Address("255.255.255.0"));
+    wanted.SetIpv4Gateway(Ipv4Address("10.0.0.1"));
+    wanted.RemoveIpv6Network(Ipv6Network("2001:db8::1/64"));
+    wanted.AddIpv6Network(Ipv6Network("2001:db8::2/64"));
+    IpConfig now = wanted;
+    EXPECT_EQ(ConfigDifference(before, wanted, now), "");
+
+    IpConfig other = now;
+    other.SetIpv4Address(Ipv4Address("10.0.0.6"));
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "its IPv4 address is 10.0.0.6 netmask 255.255.255.0");
+    other.SetIpv4UseNone();
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "it has no IPv4 address");
+    other = now;
+    other.SetIpv4Gateway(Ipv4Address());
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "its IPv4 gateway is none");
+    other = now;
+    other.SetUseIpv6RouterAdvertised(true);
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "router advertisements are accepted");
+    other = now;
+    other.AddIpv6Network(Ipv6Network("2001:db8::1/64"));
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "it still has the IPv6 address 2001:db8::1/64");
+    other.RemoveIpv6Network(Ipv6Network("2001:db8::2/64"));
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "it has no IPv6 address 2001:db8::2/64");
+    other.SetUseIpv6(false);
+    EXPECT_EQ(ConfigDifference(before, wanted, other), "IPv6 is off");
+
+    // A lease is the DHCP client's: its address is not compared.
+    IpConfig leased = wanted;
+    leased.SetUseDhcp(true);
+    other = now;
+    other.SetIpv4Address(Ipv4Address("10.9.9.9"));
+    EXPECT_EQ(ConfigDifference(before, leased, other), "");
+}
+
 }  // namespace

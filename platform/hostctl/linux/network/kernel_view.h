@@ -13,6 +13,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "hostctl/network/types.h"
 #include "kernel/addresses.h"
 #include "kernel/links.h"
 #include "kernel/multicast.h"
@@ -45,6 +46,12 @@ std::string RouteSource(unsigned protocol);
 std::uint32_t NeighbourState(std::uint16_t nud);
 std::string NeighbourType(const Kernel::Neighbour& entry);
 std::uint32_t NeighbourExpiry(const Kernel::Neighbour& entry, const Kernel::NeighbourTiming& timing);
+
+// What an interface's configuration after a change (now) lacks of what was asked (wanted, the
+// configuration before being before); empty when it holds it all. The default route of IPv6 is
+// not compared here (the routes router advertisements bring are told apart by the view).
+std::string ConfigDifference(const HostCtl::Network::IpConfig& before,
+                             const HostCtl::Network::IpConfig& wanted, const HostCtl::Network::IpConfig& now);
 
 class NetstackView {
 public:

@@ -213,10 +213,9 @@ public:
                                   Ipv6Status(*address));
         }
         config.SetIpv6Networks(std::move(networks));
-        // Refresh() of `link` is not needed: the tables above were read at one generation.
-        const Kernel::Link& current = Require(id);
-        config.SetUseIpv6(current.ipv6 && !current.ipv6->disabled);
-        config.SetUseIpv6RouterAdvertised(current.ipv6 && current.ipv6->AcceptsRouterAdvertisements());
+        // The tables are read at one generation: `link` still stands.
+        config.SetUseIpv6(link.ipv6 && !link.ipv6->disabled);
+        config.SetUseIpv6RouterAdvertised(link.ipv6 && link.ipv6->AcceptsRouterAdvertisements());
         config.SetUseIpv6Dhcp(leasedIpv6);
         if (const auto* route = DefaultThrough(view.DefaultRoutes(AF_INET6), index))
             config.SetIpv6Gateway(Ipv6Address(route->nexthops.front().gateway));
@@ -659,36 +658,8 @@ private:
 
     void ReadBack(const InterfaceId& id, const IpConfig& before, const IpConfig& wanted) {
         IpConfig now = GetIpConfig(id);
-        if (!wanted.GetUseDhcp()) {
-            if (now.GetIpv4Address() != wanted.GetIpv4Address() ||
-                now.GetIpv4Netmask() != wanted.GetIpv4Netmask()) {
-                Differs(id, now.GetIpv4Address().IsUnspecified()
-                                ? std::string("it has no IPv4 address")
-                                : "its IPv4 address is " + now.GetIpv4Address().GetStringAddress() +
-                                      " netmask " + now.GetIpv4Netmask().GetStringAddress());
-            }
-            if (now.GetIpv4Gateway() != wanted.GetIpv4Gateway() && !wanted.GetIpv4Address().IsUnspecified())
-                Differs(id, "its IPv4 gateway is " + (now.GetIpv4Gateway().IsUnspecified()
-                                                          ? std::string("none")
-                                                          : now.GetIpv4Gateway().GetStringAddress()));
-        }
-        if (now.GetUseIpv6() != wanted.GetUseIpv6())
-            Differs(id, std::string("IPv6 is ") + (now.GetUseIpv6() ? "on" : "off"));
-        if (now.GetUseIpv6RouterAdvertised() != wanted.GetUseIpv6RouterAdvertised())
-            Differs(id, std::string("router advertisements are ") +
-                            (now.GetUseIpv6RouterAdvertised() ? "accepted" : "ignored"));
-        if (!wanted.GetUseIpv6()) return;
-        const auto& have = now.GetIpv6Network();
-        for (const auto& n : wanted.GetIpv6Network()) {
-            if (std::find(have.begin(), have.end(), n) == have.end() && before.GetUseIpv6())
-                Differs(id, "it has no IPv6 address " + n.GetStringAddress());
-        }
-        for (const auto& n : before.GetIpv6Network()) {
-            const auto& asked = wanted.GetIpv6Network();
-            if (before.GetUseIpv6() && std::find(asked.begin(), asked.end(), n) == asked.end() &&
-                std::find(have.begin(), have.end(), n) != have.end())
-                Differs(id, "it still has the IPv6 address " + n.GetStringAddress());
-        }
+        if (std::string difference = ConfigDifference(before, wanted, now); !difference.empty())
+            Differs(id, difference);
         if (GatewayDiffers6(id, now, wanted)) {
             Differs(id, "its IPv6 gateway is " + (now.GetIpv6Gateway().IsUnspecified()
                                                       ? std::string("none")
@@ -756,6 +727,43 @@ private:
 };
 
 }  // namespace
+
+std::string ConfigDifference(const IpConfig& before, const IpConfig& wanted, const IpConfig& now) {
+    auto text = [](const auto& address, const char* unset) {
+        return address.IsUnspecified() ? std::string(unset) : address.GetStringAddress();
+    };
+    if (!wanted.GetUseDhcp()) {
+        if (now.GetIpv4Address() != wanted.GetIpv4Address() ||
+            now.GetIpv4Netmask() != wanted.GetIpv4Netmask()) {
+            return now.GetIpv4Address().IsUnspecified()
+                       ? std::string("it has no IPv4 address")
+                       : "its IPv4 address is " + text(now.GetIpv4Address(), "") + " netmask " +
+                             text(now.GetIpv4Netmask(), "");
+        }
+        if (now.GetIpv4Gateway() != wanted.GetIpv4Gateway() && !wanted.GetIpv4Address().IsUnspecified())
+            return "its IPv4 gateway is " + text(now.GetIpv4Gateway(), "none");
+    }
+    if (now.GetUseIpv6() != wanted.GetUseIpv6())
+        return std::string("IPv6 is ") + (now.GetUseIpv6() ? "on" : "off");
+    if (now.GetUseIpv6RouterAdvertised() != wanted.GetUseIpv6RouterAdvertised())
+        return std::string("router advertisements are ") +
+               (now.GetUseIpv6RouterAdvertised() ? "accepted" : "ignored");
+    // The addresses of an interface whose IPv6 was off are those given back and asked for, which
+    // the kernel may still be checking; a change while it stays on is checked address by address.
+    if (!wanted.GetUseIpv6() || !before.GetUseIpv6()) return {};
+    const auto& have = now.GetIpv6Network();
+    const auto& asked = wanted.GetIpv6Network();
+    for (const auto& n : asked) {
+        if (std::find(have.begin(), have.end(), n) == have.end())
+            return "it has no IPv6 address " + n.GetStringAddress();
+    }
+    for (const auto& n : before.GetIpv6Network()) {
+        if (std::find(asked.begin(), asked.end(), n) == asked.end() &&
+            std::find(have.begin(), have.end(), n) != have.end())
+            return "it still has the IPv6 address " + n.GetStringAddress();
+    }
+    return {};
+}
 
 std::unique_ptr<Backend::Interfaces> MakeInterfaces(Context& context) {
     return std::make_unique<LinuxInterfaces>(context);

@@ -336,15 +336,15 @@ std::string RealReaching(Backend::Routing& area, const std::string& netstack, co
     auto nics = area.InterfacesReaching(netstack, gateway);
     if (nics.empty()) {
         throw HostCtlException("Gateway " + gateway.GetStringAddress() +
-                               " is unreachable: no Tarkon interface of " + "netstack " +
-                               Lib::Quote(netstack) + " is on its subnet");
+                               " is unreachable: no Tarkon interface of netstack " + Lib::Quote(netstack) +
+                               " is on its subnet");
     }
     if (IsLinkLocal(gateway) && nics.size() > 1) {
         std::string names;
         for (const auto& nic : nics)
             names += (names.empty() ? "" : ", ") + nic;
         throw HostCtlException("Gateway " + gateway.GetStringAddress() +
-                               " is a link-local address, on the link of " + "each of " + names +
+                               " is a link-local address, on the link of each of " + names +
                                ": give an address of the gateway on a subnet of one of them");
     }
     return nics.front();

@@ -172,13 +172,4 @@ TEST(KernelAnswers, TheKernelsReasonIsReadWhetherTheRequestIsEchoedOrNot) {
     EXPECT_EQ(Kernel::ParseAnswer(&truncated).error, -EBADMSG);
 }
 
-TEST(KernelAnswers, AddressesConvertBothWaysAndRefuseTheWrongFamily) {
-    unsigned char bytes[16];
-    ASSERT_TRUE(Kernel::AddressBytes(AF_INET6, "2001:db8::1", bytes));
-    EXPECT_EQ(Kernel::AddressText(AF_INET6, bytes, 16), "2001:db8::1");
-    EXPECT_FALSE(Kernel::AddressBytes(AF_INET, "2001:db8::1", bytes));
-    EXPECT_FALSE(Kernel::AddressBytes(AF_PACKET, "10.0.0.1", bytes));
-    EXPECT_EQ(Kernel::AddressText(AF_INET6, bytes, 4), "");  // too short for the family
-}
-
 }  // namespace

@@ -12,7 +12,6 @@
 #include "hostctl/exception.h"
 #include "kernel/request.h"
 #include "kernel/routes.h"
-#include "network/kernel_view.h"
 
 namespace {
 
@@ -139,17 +138,6 @@ TEST(Routes, AnAddIsExclusiveAndADeleteMatchesAnyScope) {
     EXPECT_THROW(Kernel::BuildRouteRequest(RTM_NEWROUTE, route), HostCtl::Lib::HostCtlException);
     route.family = AF_PACKET;
     EXPECT_THROW(Kernel::BuildRouteRequest(RTM_NEWROUTE, route), HostCtl::Lib::HostCtlException);
-}
-
-TEST(Routes, TheSourceOfARouteIsWhoInstalledIt) {
-    using TknCtl::Linux::RouteSource;
-    EXPECT_EQ(RouteSource(RTPROT_KERNEL), "MANUAL");
-    EXPECT_EQ(RouteSource(RTPROT_BOOT), "MANUAL");
-    EXPECT_EQ(RouteSource(RTPROT_STATIC), "MANUAL");
-    EXPECT_EQ(RouteSource(RTPROT_DHCP), "DHCP");
-    EXPECT_EQ(RouteSource(RTPROT_RA), "RA");
-    EXPECT_EQ(RouteSource(RTPROT_BGP), "BGP");
-    EXPECT_EQ(RouteSource(250), "PROTOCOL 250");
 }
 
 }  // namespace

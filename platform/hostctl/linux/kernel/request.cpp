@@ -39,7 +39,9 @@ struct CallbacksPut {
 using Callbacks = std::unique_ptr<nl_cb, CallbacksPut>;
 
 Callbacks CloneCallbacks(nl_sock* sock) {
-    Callbacks cb(nl_cb_clone(nl_socket_get_cb(sock)));
+    // nl_socket_get_cb hands out a reference of its own.
+    Callbacks base(nl_socket_get_cb(sock));
+    Callbacks cb(nl_cb_clone(base.get()));
     if (!cb) throw HostCtlException("out of memory");
     return cb;
 }
@@ -193,8 +195,8 @@ void Dump(const Namespace& ns, int type, const void* header, std::size_t size,
             if (received.msg_flags & MSG_TRUNC)
                 throw HostCtlException(what + ": a reply was too long to read");
             int remaining = static_cast<int>(length);
-            for (auto* reply = reinterpret_cast<nlmsghdr*>(buffer.data()); NLMSG_OK(reply, remaining);
-                 reply = NLMSG_NEXT(reply, remaining)) {
+            for (auto* reply = reinterpret_cast<nlmsghdr*>(buffer.data()); nlmsg_ok(reply, remaining);
+                 reply = nlmsg_next(reply, &remaining)) {
                 if (reply->nlmsg_seq != sequence) continue;  // what is left of an abandoned dump
                 if (reply->nlmsg_flags & NLM_F_DUMP_INTR) interrupted = true;
                 if (reply->nlmsg_type == NLMSG_DONE) {

@@ -169,6 +169,13 @@ TEST_F(InterfacesTest, TheRulesOfIpv4AddressesRefuseBeforeAnythingChanges) {
             prefix +
                 "DHCP is not available on the Linux host: it needs a DHCP client, which the kernel does not "
                 "have, and no client manages a0\n");
+    // br0 is down: a gateway through it is refused before its address changes.
+    auto down =
+        Hadro("network ip interface ipv4 set -i br0 -t static -I 10.6.0.1 -N 255.255.255.0 -g 10.6.0.9");
+    EXPECT_EQ(
+        down.err,
+        "Error changing IPv4 configuration for the interface br0. Error was : br0 is down, and the kernel "
+        "routes through no interface that is down: enable it before giving it a gateway\n");
     EXPECT_EQ(Sh("ip -j addr show") + Sh("ip -j route show"), before);
     // An address is unique on its netstack only: another netstack may have it.
     EXPECT_EQ(Hadro("network ip interface ipv4 set -i g1 -t static -I 10.4.0.1 -N 255.255.255.0").status, 0);

@@ -278,15 +278,7 @@ public:
         if (!netstacks.is_object()) netstacks = json::object();
         json& names = netstacks[id.netstack];
         if (!names.is_object()) names = json::object();
-        // Tags of interfaces gone from the netstack go with them.
-        auto& view = View(id);
-        for (auto it = names.begin(); it != names.end();) {
-            if (it.key() != id.name && !view.IpInterface(it.key())) {
-                it = names.erase(it);
-            } else {
-                ++it;
-            }
-        }
+        PruneGone(names, id);
         if (tags.empty()) {
             names.erase(id.name);
         } else {
@@ -446,6 +438,12 @@ private:
         auto check = [&](int family, const std::string& gateway, const std::string& currentGateway,
                          const char* what) {
             if (gateway.empty() || gateway == currentGateway) return;
+            // The kernel routes only through a device that is up.
+            if (!Require(id).up) {
+                throw HostCtlException(id.name +
+                                       " is down, and the kernel routes through no interface that is "
+                                       "down: enable it before giving it a gateway");
+            }
             for (const auto& route : view.DefaultRoutes(family)) {
                 if (!route.IsDefault() || route.type != RTN_UNICAST || route.metric != DefaultMetric(family))
                     continue;
@@ -669,6 +667,19 @@ private:
 
     // ---------------------------------------------------------------- the document
 
+    // What the document keeps of interfaces gone from id's netstack (members named after them)
+    // goes with them.
+    void PruneGone(json& byName, const InterfaceId& id) {
+        auto& view = View(id);
+        for (auto it = byName.begin(); it != byName.end();) {
+            if (it.key() != id.name && !view.IpInterface(it.key())) {
+                it = byName.erase(it);
+            } else {
+                ++it;
+            }
+        }
+    }
+
     // The member's tags of an interface (an array of tag names), or null.
     const json& TagsOf(const json& member, const InterfaceId& id) {
         static const json none = json::array();
@@ -712,6 +723,7 @@ private:
         if (!kept.is_object()) kept = json::object();
         json& netstack = kept[id.netstack];
         if (!netstack.is_object()) netstack = json::object();
+        PruneGone(netstack, id);
         if (addresses.empty()) {
             netstack.erase(id.name);
         } else {

@@ -6,10 +6,6 @@ namespace {
 
 using nlohmann::json;
 
-bool Has(const std::string& text, const std::string& part) {
-    return text.find(part) != std::string::npos;
-}
-
 json Entry(const json& list, const std::string& address) {
     for (const auto& record : list) {
         if (record["Neighbor"] == address) return record;
@@ -95,12 +91,11 @@ TEST_F(NeighboursTest, AnEntryGoesFromOneInterfaceOrFromAll) {
 }
 
 TEST_F(NeighboursTest, Ipv6EntriesShowTheirStateAndRouters) {
-    auto global = Hadro("network ip get");
-    if (Has(global.err, "not available on the Linux host"))
-        GTEST_SKIP() << "the global IPv6 switch (network ip get) is not available on the Linux host yet";
     Build();
     Sh("ip -6 neigh add 2001:db8::9 lladdr 02:00:00:00:00:09 dev a0 router nud reachable"
        " && ip -6 neigh add 2001:db8::a lladdr 02:00:00:00:00:0a dev a0 nud stale");
+    // The kernel's own entries of multicast groups (NOARP) are no neighbours: ip leaves them out too.
+    EXPECT_EQ(HadroJson("network ip neighbor list -v 6").size(), ShJson("ip -j -6 neigh show").size());
     auto list = HadroJson("network ip neighbor list -v 6 -i a0");
     EXPECT_EQ(Entry(list, "2001:db8::9")["Type"], "Router");
     EXPECT_EQ(Entry(list, "2001:db8::9")["State"], "Reachable");

@@ -385,6 +385,9 @@ private:
         int only = link ? link->index : 0;
         for (const auto& entry : view.Neighbours(family)) {
             if (only != 0 && entry.index != only) continue;
+            // As `ip neigh` lists them: the kernel's own entries for multicast and broadcast
+            // addresses (NOARP) and entries that hold nothing (NONE) are no neighbours.
+            if (!(entry.state & (0xFF & ~NUD_NOARP))) continue;
             const auto* link = view.LinkByIndex(entry.index);
             if (!link || !IsIpInterface(*link, view.Links())) continue;
             make(entry, link->name, NeighbourExpiry(entry, view.TimingOf(family, entry.index)));

@@ -1,4 +1,5 @@
 // Value types: parsing, canonical printing, bounds and equality.
+#include <arpa/inet.h>
 #include <gtest/gtest.h>
 
 #include <string>
@@ -69,6 +70,24 @@ TEST(Ipv4Address, ParsesDottedQuadOnly) {
     EXPECT_NE(Ipv4Address("10.0.0.1"), Ipv4Address("10.0.0.2"));
     EXPECT_TRUE(Ipv4Address("255.255.254.0").IsNetmask());
     EXPECT_FALSE(Ipv4Address("255.0.255.0").IsNetmask());
+}
+
+TEST(Ipv4Address, PrintsWhatInetNtopPrints) {
+    // Every value of each byte in every position, and a spread of whole addresses.
+    auto check = [](std::uint32_t hostOrder) {
+        auto address = Ipv4Address::FromHostOrder(hostOrder);
+        char expected[INET_ADDRSTRLEN];
+        inet_ntop(AF_INET, &address.GetAddress(), expected, sizeof(expected));
+        ASSERT_EQ(address.GetStringAddress(), expected) << hostOrder;
+    };
+    for (std::uint32_t value = 0; value < 256; ++value) {
+        for (int shift : {0, 8, 16, 24})
+            check(value << shift);
+        check(value * 0x01010101u);
+    }
+    for (std::uint32_t value = 1; value != 0 && value < 0xfff00000u; value += 104729u * 7)
+        check(value);
+    check(0xffffffffu);
 }
 
 TEST(Ipv6Address, PrintsTheCompressedLowerCaseForm) {

@@ -215,12 +215,21 @@ std::optional<Link> ParseLink(const nlmsghdr* message) {
     return link;
 }
 
-std::vector<Link> ListLinks(const Namespace& ns) {
+std::vector<Link> ListLinks(const Namespace& ns, bool withStats) {
     std::vector<Link> links;
-    ifinfomsg header{};
-    header.ifi_family = AF_UNSPEC;
+    // The request: the family header, then IFLA_EXT_MASK saying what to leave out.
+    struct {
+        ifinfomsg header;
+        rtattr mask;
+        std::uint32_t filter;
+    } request{};
+    static_assert(sizeof(request) == NLMSG_ALIGN(sizeof(ifinfomsg)) + RTA_LENGTH(sizeof(std::uint32_t)));
+    request.header.ifi_family = AF_UNSPEC;
+    request.mask.rta_type = IFLA_EXT_MASK;
+    request.mask.rta_len = RTA_LENGTH(sizeof(std::uint32_t));
+    request.filter = withStats ? 0 : RTEXT_FILTER_SKIP_STATS;
     Dump(
-        ns, RTM_GETLINK, &header, sizeof(header), [&] { links.clear(); },
+        ns, RTM_GETLINK, &request, sizeof(request), [&] { links.clear(); },
         [&](const nlmsghdr* message) {
             if (auto link = ParseLink(message)) links.push_back(std::move(*link));
         },

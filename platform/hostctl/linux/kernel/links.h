@@ -57,8 +57,9 @@ struct Link {
     std::optional<Ipv6Settings> ipv6;
 };
 
-// Every link of the namespace, in index order.
-std::vector<Link> ListLinks(const Namespace& ns);
+// Every link of the namespace, in index order. Without stats the kernel leaves out the
+// counters of every device (its own and IPv6's): a listing of many devices costs much less.
+std::vector<Link> ListLinks(const Namespace& ns, bool withStats = true);
 // The link of that name, or nothing.
 std::optional<Link> FindLink(const Namespace& ns, const std::string& name);
 

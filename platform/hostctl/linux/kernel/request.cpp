@@ -1,5 +1,7 @@
 #include "kernel/request.h"
 
+#include "hostctl/network/types.h"
+
 #include <arpa/inet.h>
 #include <linux/netlink.h>
 #include <netlink/msg.h>
@@ -234,6 +236,11 @@ void Changed() {
 
 std::string AddressText(int family, const void* bytes, std::size_t length) {
     if (!((family == AF_INET && length >= 4) || (family == AF_INET6 && length >= 16))) return {};
+    if (family == AF_INET) {
+        in_addr address;
+        std::memcpy(&address, bytes, sizeof(address));
+        return HostCtl::Network::Ipv4Address(address).GetStringAddress();
+    }
     char text[INET6_ADDRSTRLEN];
     if (!inet_ntop(family, bytes, text, sizeof(text))) return {};
     return text;

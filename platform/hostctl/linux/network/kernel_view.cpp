@@ -82,7 +82,7 @@ void NetstackView::Fresh() {
 
 const std::vector<Kernel::Link>& NetstackView::Links() {
     Fresh();
-    if (!links_) links_ = Kernel::ListLinks(ns_);
+    if (!links_) links_ = Kernel::ListLinks(ns_, false);
     return *links_;
 }
 

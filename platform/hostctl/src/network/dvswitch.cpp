@@ -1,4 +1,5 @@
 // Distributed switches.
+#include "backend/host.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -13,6 +14,8 @@ using HostCtl::Lib::HostCtlException;
 namespace {
 const Model::DvSwitch& EnterSwitch(const char* operation, const std::string& name, const std::string& arguments = {}) {
     Lib::Enter(std::string("HostCtl::Network::DVSwitch::") + operation, name, arguments);
+    // The distributed switches of a real host are its area's (a plain Linux host has none).
+    if (Lib::RealHost()) throw HostCtlException("Distributed switch " + name + " does not exist");
     const auto* dvs = Lib::Read<Model::DvSwitchesSection>().Find(name);
     if (!dvs) throw HostCtlException("Distributed switch " + name + " does not exist");
     return *dvs;

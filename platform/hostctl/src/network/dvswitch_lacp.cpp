@@ -2,6 +2,7 @@
 // LAGs, and the LACP timeout of their member NICs.
 #include <algorithm>
 
+#include "backend/host.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -18,6 +19,8 @@ namespace {
 constexpr std::uint8_t kShortTimeoutBit = 0x02;
 
 const Model::DvSwitch& FindSwitch(const std::string& name) {
+    // The distributed switches of a real host are its area's (a plain Linux host has none).
+    if (Lib::RealHost()) throw HostCtlException("Distributed switch " + name + " does not exist");
     const auto* dvs = Lib::Read<Model::DvSwitchesSection>().Find(name);
     if (!dvs) throw HostCtlException("Distributed switch " + name + " does not exist");
     return *dvs;

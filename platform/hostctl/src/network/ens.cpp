@@ -7,6 +7,8 @@
 // exists, removing one that does not, associating a context with the switch it already
 // serves, disassociating one that serves none. A malformed request throws.
 #include "model/ens.h"
+#include "backend/host.h"
+#include "backend/switches.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -29,6 +31,8 @@ std::string Id(unsigned long id) {
 
 void Enter(const char* operation, const std::string& args = {}) {
     TknCtl::Lib::Enter(std::string("HostCtl::Network::NetworkInfo::") + operation, {}, args);
+    // A real host answers for its ENS contexts (the Linux host has none and refuses).
+    if (auto* host = TknCtl::Lib::RealHost()) host->GetSwitches().RequireEns();
 }
 
 // An ID the host could hold: below the maximum.

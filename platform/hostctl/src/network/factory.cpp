@@ -20,12 +20,15 @@ std::unique_ptr<NetworkInfo> NetworkFactory::GetNetworkInfo() {
 
 std::unique_ptr<DVSwitch> NetworkFactory::GetDVSwitchByName(std::string name) {
     TknCtl::Lib::Enter("HostCtl::Network::NetworkFactory::GetDVSwitchByName", name);
+    if (TknCtl::Lib::RealHost()) return TknCtl::Network::VirtualSwitchInfoImpl().GetDVSwitchByName(name);
     if (!TknCtl::Lib::Read<TknCtl::Model::DvSwitchesSection>().Find(name)) return nullptr;
     return std::make_unique<TknCtl::Network::DVSwitchImpl>(name);
 }
 
 std::unique_ptr<DVPort> NetworkFactory::GetDVPort(const DVPortParam& param) {
     TknCtl::Lib::Enter("HostCtl::Network::NetworkFactory::GetDVPort", param.GetPortId(), param.GetSwitchUuid());
+    if (TknCtl::Lib::RealHost())
+        throw Lib::HostCtlException("No distributed switch with UUID '" + param.GetSwitchUuid() + "'");
     const auto* dvs = TknCtl::Lib::Read<TknCtl::Model::DvSwitchesSection>().FindByUuid(param.GetSwitchUuid());
     if (!dvs) throw Lib::HostCtlException("No distributed switch with UUID '" + param.GetSwitchUuid() + "'");
     if (!dvs->FindPort(param.GetPortId())) {

@@ -2,6 +2,7 @@
 // switches.
 #include <algorithm>
 
+#include "backend/switches.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -13,6 +14,7 @@
 #include "model/tknnics.h"
 #include "model/vswitches.h"
 #include "network/internal.h"
+#include "network/vswitch_model.h"
 
 namespace HostCtl::Network {
 
@@ -52,6 +54,9 @@ std::unique_ptr<HostCtl::Network::Portset> MakeStandardPortset(const std::string
 
 namespace {
 const Model::Port& FindPort(std::uint32_t id) {
+    // A real host hands out no ports (VirtualSwitchImpl::GetPorts).
+    if (VSwitchModel::RealSwitches())
+        throw HostCtlException("Port " + std::to_string(id) + " does not exist");
     const auto* port = Lib::Read<Model::PortsSection>().Find(id);
     if (!port) throw HostCtlException("Port " + std::to_string(id) + " does not exist");
     return *port;
@@ -150,6 +155,12 @@ std::vector<std::unique_ptr<HostCtl::Network::FilterStats>> PortImpl::GetFilterS
 
 namespace {
 const Model::DvPort* LookupDvPort(const HostCtl::Network::DVPortParam& param, const Model::DvSwitch** owner) {
+    // A real host's distributed switches have no ports this library serves (the area lists
+    // none on a plain Linux host).
+    if (VSwitchModel::RealSwitches()) {
+        if (owner) *owner = nullptr;
+        return nullptr;
+    }
     const auto* dvs = Lib::Read<Model::DvSwitchesSection>().FindByUuid(param.GetSwitchUuid());
     if (owner) *owner = dvs;
     return dvs ? dvs->FindPort(param.GetPortId()) : nullptr;
@@ -242,6 +253,7 @@ void DVPortImpl::SetConnectionId(std::uint32_t connectionId) {
 
 bool PortsetImpl::IsValidVirtualSwitch(const std::string& name) {
     Lib::Enter("TknCtl::Network::PortsetImpl::IsValidVirtualSwitch", name);
+    if (auto* real = VSwitchModel::RealSwitches()) return real->Has(name);
     return Lib::Read<Model::VSwitchesSection>().Find(name) != nullptr;
 }
 
@@ -251,6 +263,13 @@ VirtualSwitchInfoImpl::~VirtualSwitchInfoImpl() = default;
 std::vector<std::unique_ptr<HostCtl::Network::Portset>> VirtualSwitchInfoImpl::GetAllSwitches() {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::GetAllSwitches");
     std::vector<std::unique_ptr<HostCtl::Network::Portset>> switches;
+    if (auto* real = VSwitchModel::RealSwitches()) {
+        for (const auto& name : real->List())
+            switches.push_back(Internal::MakeStandardPortset(name));
+        for (const auto& name : real->DistributedSwitches())
+            switches.push_back(std::make_unique<DVSwitchImpl>(name));
+        return switches;
+    }
     for (const auto& vswitch : Lib::Read<Model::VSwitchesSection>().switches) {
         switches.push_back(Internal::MakeStandardPortset(vswitch.name));
     }
@@ -262,16 +281,23 @@ std::vector<std::unique_ptr<HostCtl::Network::Portset>> VirtualSwitchInfoImpl::G
 
 bool VirtualSwitchInfoImpl::IsLegacySwitch(const std::string& name) {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::IsLegacySwitch", name);
+    if (auto* real = VSwitchModel::RealSwitches()) return real->Has(name);
     return Lib::Read<Model::VSwitchesSection>().Find(name) != nullptr;
 }
 
 bool VirtualSwitchInfoImpl::IsDVSwitch(const std::string& name) {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::IsDVSwitch", name);
+    if (auto* real = VSwitchModel::RealSwitches()) {
+        const auto names = real->DistributedSwitches();
+        return std::find(names.begin(), names.end(), name) != names.end();
+    }
     return Lib::Read<Model::DvSwitchesSection>().Find(name) != nullptr;
 }
 
 bool VirtualSwitchInfoImpl::IsOpaqueSwitch(const std::string& name) {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::IsOpaqueSwitch", name);
+    // A real host has no opaque networks.
+    if (VSwitchModel::RealSwitches()) return false;
     // Opaque switches are known only through the interfaces attached to their networks.
     const auto& nics = Lib::Read<Model::TknNicsSection>().nics;
     return std::any_of(nics.begin(), nics.end(), [&](const Model::TknNic& nic) {
@@ -282,6 +308,11 @@ bool VirtualSwitchInfoImpl::IsOpaqueSwitch(const std::string& name) {
 std::vector<std::unique_ptr<HostCtl::Network::DVSwitch>> VirtualSwitchInfoImpl::GetDVSwitches() {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::GetDVSwitches");
     std::vector<std::unique_ptr<HostCtl::Network::DVSwitch>> switches;
+    if (auto* real = VSwitchModel::RealSwitches()) {
+        for (const auto& name : real->DistributedSwitches())
+            switches.push_back(std::make_unique<DVSwitchImpl>(name));
+        return switches;
+    }
     for (const auto& dvs : Lib::Read<Model::DvSwitchesSection>().switches) {
         switches.push_back(std::make_unique<DVSwitchImpl>(dvs.name));
     }
@@ -291,6 +322,11 @@ std::vector<std::unique_ptr<HostCtl::Network::DVSwitch>> VirtualSwitchInfoImpl::
 std::unique_ptr<HostCtl::Network::DVSwitch> VirtualSwitchInfoImpl::GetDVSwitchByName(
     const std::string& name) {
     Lib::Enter("TknCtl::Network::VirtualSwitchInfoImpl::GetDVSwitchByName", name);
+    if (auto* real = VSwitchModel::RealSwitches()) {
+        const auto names = real->DistributedSwitches();
+        if (std::find(names.begin(), names.end(), name) == names.end()) return nullptr;
+        return std::make_unique<DVSwitchImpl>(name);
+    }
     if (!Lib::Read<Model::DvSwitchesSection>().Find(name)) return nullptr;
     return std::make_unique<DVSwitchImpl>(name);
 }

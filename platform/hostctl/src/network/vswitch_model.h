@@ -7,6 +7,10 @@
 #include "hostctl/network/vswitch.h"
 #include "model/vswitches.h"
 
+namespace TknCtl::Backend {
+class Switches;
+}
+
 namespace TknCtl::Network::VSwitchModel {
 
 HostCtl::Network::NicTeamingPolicy ToPublic(const Model::TeamingPolicy& policy);
@@ -41,5 +45,11 @@ void DropFromOrder(Model::TeamingPolicy& policy, const std::string& uplink);
 
 // The switch of that name; throws HostCtlException when there is none.
 const Model::VSwitch& FindSwitch(const std::string& name);
+
+// The switch area of the real host the session manages; nullptr on the simulated host.
+Backend::Switches* RealSwitches();
+// A switch of the real host in the model's shape (its uplinks, its stored policy, its port
+// groups' overrides), so that the policy rules above serve both hosts.
+Model::VSwitch RealSwitchModel(Backend::Switches& switches, const std::string& name);
 
 }  // namespace TknCtl::Network::VSwitchModel

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <set>
 
+#include "backend/host.h"
+#include "backend/switches.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -207,6 +209,28 @@ const Model::VSwitch& FindSwitch(const std::string& name) {
     const auto* vswitch = Lib::Read<Model::VSwitchesSection>().Find(name);
     if (!vswitch) throw HostCtlException("Virtual switch " + name + " does not exist");
     return *vswitch;
+}
+
+Backend::Switches* RealSwitches() {
+    auto* host = Lib::RealHost();
+    return host ? &host->GetSwitches() : nullptr;
+}
+
+Model::VSwitch RealSwitchModel(Backend::Switches& switches, const std::string& name) {
+    const auto state = switches.Read(name);
+    const auto stored = switches.ReadPolicy(name);
+    Model::VSwitch vswitch;
+    vswitch.name = name;
+    vswitch.uplinks = state.uplinks;
+    vswitch.policy = {ToModel(stored.teaming), ToModel(stored.security), ToModel(stored.shaping)};
+    for (const auto& groupName : state.portGroups) {
+        const auto own = switches.ReadPortGroupPolicy(groupName);
+        Model::PortGroup group;
+        group.name = groupName;
+        group.policy = {ToModel(own.teaming), ToModel(own.security), ToModel(own.shaping)};
+        vswitch.portGroups.push_back(std::move(group));
+    }
+    return vswitch;
 }
 
 }  // namespace TknCtl::Network::VSwitchModel

@@ -82,6 +82,21 @@ TEST_F(SwitchesTest, WhatABridgeCannotBeIsRefusedAndNothingIsMade) {
                   "BR_MAX_PORTS), not 2048");
     ExpectRefused("network vswitch standard add -v v9",
                   "Unable to create virtual switch v9: the host has a network device of that name (veth)");
+    // The host's ports are shared by its switches.
+    for (const char* name : {"vs1", "vs2", "vs3", "vs4"})
+        EXPECT_EQ(Hadro(std::string("network vswitch standard add -P 1024 -v ") + name).status, 0);
+    ExpectRefused(
+        "network vswitch standard add -v vs5 -P 1024",
+        "Unable to create virtual switch vs5: 1024 ports requested, but only 512 of the host's 4608 ports "
+        "are left");
+    // A switch has no more ports than it was given.
+    Hadro("network vswitch standard add -v tiny -P 1");
+    Sh("ip link add vp0 type veth peer name tkn0 && ip link set vp0 master tiny");
+    ExpectRefused("network vswitch standard uplink add -v tiny -u e1",
+                  "Unable to add uplink e1 to virtual switch tiny: the switch has no free port");
+    Sh("ip link del vp0");
+    for (const char* name : {"vs1", "vs2", "vs3", "vs4", "tiny"})
+        Hadro(std::string("network vswitch standard remove -v ") + name);
     auto unprivileged = HadroUnprivileged("network vswitch standard add -v vs1");
     EXPECT_EQ(unprivileged.status, 1);
     EXPECT_EQ(unprivileged.err, "Changing the host's network needs root (CAP_NET_ADMIN)\n");
@@ -118,11 +133,21 @@ TEST_F(SwitchesTest, AnUplinkIsANicPortOfTheBridgeWithTheSwitchsMtu) {
 TEST_F(SwitchesTest, AnUplinkThatIsNotTheHostsToGiveIsRefused) {
     Hadro("network vswitch standard add -v vs1");
     Sh("ip link add br0 type bridge && ip link set e2 master br0");
-    Sh("ip addr add 192.0.2.7/24 dev e3 && ip addr add 2001:db8::7/64 dev e3 nodad");
     ExpectRefused("network vswitch standard uplink add -v vs1 -u v9",
                   "Unable to add uplink v9 to virtual switch vs1: the host has no physical NIC of that name");
     ExpectRefused("network vswitch standard uplink add -v vs1 -u e2",
                   "Unable to add uplink e2 to virtual switch vs1: it is an uplink of virtual switch br0");
+    Sh("ip link add mv0 link e1 type macvlan");
+    ExpectRefused(
+        "network vswitch standard uplink add -v vs1 -u e1",
+        "Unable to add uplink e1 to virtual switch vs1: it carries macvlan device mv0, which takes its "
+        "frames before a bridge could");
+    Sh("ip addr add 192.0.2.7/24 dev e3");
+    ExpectRefused(
+        "network vswitch standard uplink add -v vs1 -u e3",
+        "Unable to add uplink e3 to virtual switch vs1: e3 holds the address 192.0.2.7/24: a bridge port "
+        "carries no IP configuration of its own; remove it first");
+    Sh("ip addr add 2001:db8::7/64 dev e3 nodad");
     ExpectRefused("network vswitch standard uplink add -v vs1 -u e3",
                   "Unable to add uplink e3 to virtual switch vs1: e3 holds the addresses 192.0.2.7/24, "
                   "2001:db8::7/64: a bridge port carries no IP configuration of its own; remove them first");

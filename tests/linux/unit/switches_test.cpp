@@ -81,16 +81,6 @@ TEST(SwitchRecords, ADamagedMemberIsRefusedSayingWhere) {
               "'br0'.beacon: member 'requiredBy' is unknown or of the wrong type");
 }
 
-TEST(SwitchNames, ABridgeIsNamedAsADevice) {
-    EXPECT_TRUE(IsDeviceName("vSwitch0"));
-    EXPECT_TRUE(IsDeviceName("a-15-characters"));
-    EXPECT_FALSE(IsDeviceName("a-16-characters!"));
-    EXPECT_FALSE(IsDeviceName(""));
-    EXPECT_FALSE(IsDeviceName(".."));
-    EXPECT_FALSE(IsDeviceName("br:0"));
-    EXPECT_FALSE(IsDeviceName("br 0"));
-}
-
 TEST(SwitchUplinks, ANicHasADeviceOrIsNamedByTheConfiguration) {
     const auto sysfs =
         std::filesystem::temp_directory_path() / ("hadro-switches-" + std::to_string(getpid()));
@@ -104,6 +94,36 @@ TEST(SwitchUplinks, ANicHasADeviceOrIsNamedByTheConfiguration) {
     EXPECT_FALSE(IsSwitchUplinkNic(config, sysfs.string(), "up12"));
     EXPECT_FALSE(IsSwitchUplinkNic(config, sysfs.string(), "../eno1"));
     std::filesystem::remove_all(sysfs);
+}
+
+TEST(SwitchUplinks, WhatHoldsANicIsNamed) {
+    using TknCtl::Linux::Kernel::BridgeLink;
+    auto link = [](int index, const char* name, const char* kind, int peer = 0) {
+        BridgeLink out;
+        out.index = index;
+        out.name = name;
+        out.kind = kind;
+        out.peer = peer;
+        return out;
+    };
+    BridgeLink nic = link(3, "eth1", "");
+    BridgeLink bridge = link(7, "br1", "bridge");
+    bridge.bridge = TknCtl::Linux::Kernel::BridgeInfo{};
+    BridgeLink bond = link(8, "bond0", "bond");
+    BridgeLink macvlan = link(9, "mv0", "macvlan", 3);
+    EXPECT_EQ(NicHolder({nic, bridge, bond}, nic), "");
+    nic.master = 7;
+    EXPECT_EQ(NicHolder({nic, bridge, bond}, nic), "it is an uplink of virtual switch br1");
+    nic.master = 8;
+    EXPECT_EQ(NicHolder({nic, bridge, bond}, nic), "it is a port of bond device bond0");
+    nic.master = 4;
+    EXPECT_EQ(NicHolder({nic}, nic), "it is a port of device 4");
+    nic.master = 0;
+    EXPECT_EQ(NicHolder({nic, macvlan}, nic),
+              "it carries macvlan device mv0, which takes its frames before a bridge could");
+    // A macvlan of a device in another netstack is not this NIC's.
+    macvlan.peerNamespaceId = 1;
+    EXPECT_EQ(NicHolder({nic, macvlan}, nic), "");
 }
 
 Net::PortSecurityPolicy Security(bool promiscuous, bool macChange, bool forged) {
@@ -211,23 +231,6 @@ TEST(TeamingPolicies, ABridgeHasOneActiveUplinkWithoutBonding) {
         TeamingRefusal(beacon, {}, false),
         "beacon probing is not available on a Linux host: a bridge knows an uplink's failure by its link "
         "state only");
-}
-
-TEST(Overlays, APortGroupsOverridesLieOverItsSwitchsPolicy) {
-    auto base = Security(false, false, false);
-    Net::PortSecurityPolicy over;
-    over.SetAllowForgedTransmits(true);
-    EXPECT_EQ(Overlay(base, over), Security(false, false, true));
-    auto shaping = Overlay(Shaping(1000, 2000, 100), [] {
-        Net::ShapingPolicy own;
-        own.SetEnabled(false);
-        return own;
-    }());
-    EXPECT_FALSE(shaping.IsEnabled());
-    EXPECT_EQ(shaping.GetPeakBps(), 2000000u);
-    auto teaming = Overlay(Teaming({"a"}, 1), Teaming({}, 0));
-    EXPECT_TRUE(teaming.GetUplinkOrder().empty());
-    EXPECT_EQ(teaming.GetMaxActiveUplinks(), 0);
 }
 
 TEST(Vlans, APortGroupsVlanAndTheUplinksTrunk) {

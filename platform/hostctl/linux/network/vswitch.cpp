@@ -319,6 +319,27 @@ json SwitchRecordsJson(const SwitchRecords& records) {
     return member;
 }
 
+std::string NicHolder(const std::vector<Kernel::BridgeLink>& links, const Kernel::BridgeLink& nic) {
+    auto named = [](const Kernel::BridgeLink& link) {
+        return (link.kind.empty() ? std::string() : link.kind + " device ") + link.name;
+    };
+    if (nic.master != 0) {
+        for (const auto& master : links) {
+            if (master.index != nic.master) continue;
+            if (master.bridge) return "it is an uplink of virtual switch " + master.name;
+            return "it is a port of " + named(master);
+        }
+        return "it is a port of device " + std::to_string(nic.master);
+    }
+    for (const auto& upper : links) {
+        const bool takesFrames = upper.kind == "macvlan" || upper.kind == "macvtap" ||
+                                 upper.kind == "ipvlan" || upper.kind == "ipvtap";
+        if (takesFrames && upper.peer == nic.index && !upper.peerNamespaceId)
+            return "it carries " + named(upper) + ", which takes its frames before a bridge could";
+    }
+    return {};
+}
+
 bool IsSwitchUplinkNic(const Config& config, const std::string& sysfsNet, const std::string& name) {
     if (!IsDeviceName(name)) return false;
     return access((sysfsNet + "/" + name + "/device").c_str(), F_OK) == 0 || config.NamesNic(name);
@@ -606,15 +627,7 @@ void LinuxSwitches::AddUplink(const std::string& name, const std::string& nic) {
     if (!link || !IsNic(*link)) throw HostCtlException(refused + "the host has no physical NIC of that name");
     context_.BeginChange();
     if (link->master == bridge.index) throw HostCtlException(refused + "the switch already has it");
-    if (link->master != 0) {
-        const auto* master = view.ByIndex(link->master);
-        if (master && master->bridge)
-            throw HostCtlException(refused + "it is an uplink of virtual switch " + master->name);
-        throw HostCtlException(refused + "it is a port of " +
-                               (master
-                                    ? (master->kind.empty() ? "" : master->kind + " device ") + master->name
-                                    : "device " + std::to_string(link->master)));
-    }
+    if (auto why = NicHolder(view.links, *link); !why.empty()) throw HostCtlException(refused + why);
     const auto own = Kernel::Namespace::Own();
     std::vector<std::string> held;
     for (const auto& address : Kernel::ListLinkAddresses(own, link->index)) {

@@ -111,6 +111,11 @@ bool IsDeviceName(const std::string& name);
 // decides it, until the NIC area's own test serves every area.
 bool IsSwitchUplinkNic(const Config& config, const std::string& sysfsNet, const std::string& name);
 
+// Why a NIC cannot become a bridge port, whatever the bridge: it is a port of a master (a
+// bridge: another switch), or it carries a device that takes its frames before any bridge
+// could (macvlan, ipvlan); empty when nothing holds it.
+std::string NicHolder(const std::vector<Kernel::BridgeLink>& links, const Kernel::BridgeLink& nic);
+
 // ---------------------------------------------------------------- policies in kernel terms
 
 // The port flags a virtual port takes under a security policy in force; the text of the

@@ -163,6 +163,34 @@ TEST_F(PoliciesTest, ShapingATokenBucketCannotDoIsRefusedAndChangesNothing) {
     EXPECT_EQ(HadroJson("network vswitch standard policy shaping get -v vs1")["Enabled"], false);
 }
 
+TEST_F(PoliciesTest, ShapedUplinksFollowTheSwitchsMtuOrTheChangeIsRefused) {
+    Hadro("network vswitch standard policy shaping set -v vs1 -e true -b 1000 -k 2000 -t 12");
+    EXPECT_EQ(Hadro("network vswitch standard set -v vs1 -m 9000").status, 0);
+    // A NIC that the switch's shaping cannot take at the switch's MTU is given back as it was.
+    ExpectRefused(
+        "network vswitch standard uplink add -v vs1 -u e1",
+        "Unable to shape the traffic of port e1 of virtual switch vs1: a burst of 1536 bytes cannot pass a "
+        "full frame of 9014 bytes (MTU 9000): every such frame would be dropped");
+    auto e1 = ShJson("ip -j link show e1")[0];
+    EXPECT_FALSE(e1.contains("master"));
+    EXPECT_EQ(e1["mtu"], 1500);
+    EXPECT_EQ(Root("e1")["kind"], "none");
+
+    Hadro("network vswitch standard set -v vs1 -m 1500");
+    Hadro("network vswitch standard uplink add -v vs1 -u e1");
+    ExpectRefused(
+        "network vswitch standard set -v vs1 -m 9000",
+        "Unable to set the MTU of virtual switch vs1 to 9000: the shaping of uplink e1 could not follow: a "
+        "burst of 1536 bytes cannot pass a full frame of 9014 bytes (MTU 9000): every such frame would be "
+        "dropped");
+    EXPECT_EQ(ShJson("ip -j link show e1")[0]["mtu"], 1500);
+    Hadro("network vswitch standard policy shaping set -v vs1 -t 100");
+    EXPECT_EQ(Hadro("network vswitch standard set -v vs1 -m 9000").status, 0);
+    // The peak bucket holds the larger frames now.
+    EXPECT_NE(Sh("tc qdisc show dev e1").find("minburst 9018b"), std::string::npos)
+        << Sh("tc qdisc show dev e1");
+}
+
 TEST_F(PoliciesTest, FailoverIsKeptWithTheOneActiveUplinkABridgeHas) {
     Hadro("network vswitch standard uplink add -v vs1 -u e1");
     EXPECT_EQ(

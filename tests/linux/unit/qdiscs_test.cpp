@@ -40,6 +40,7 @@ TEST(TokenBuckets, ARequestReadsBackAsTheBucketAsked) {
     EXPECT_EQ(root->bucket->limit, asked.limit);
     // The burst goes through microseconds and ticks: a few bytes' worth of a microsecond.
     EXPECT_NEAR(root->bucket->burst, asked.burst, 2.0 * asked.rate / 1e6 + 16);
+    EXPECT_NEAR(root->bucket->peakBucket, asked.peakBucket, 2.0 * asked.peakRate / 1e6 + 16);
 
     TokenBucket flat{125000, 12800, 0, 0, 19050};
     root = RoundTrip(flat);

@@ -575,6 +575,18 @@ void LinuxSwitches::SetMtu(const std::string& name, int mtu) {
     context_.BeginChange();
     const auto own = Kernel::Namespace::Own();
     const auto wanted = static_cast<unsigned>(mtu);
+    // A shaped uplink's token bucket is made for its frames: it must take the larger ones too.
+    const auto record = RecordOf(Records(), name);
+    if (record.policy.shaping.IsEnabled()) {
+        for (const auto& uplink : UplinkNames(view, bridge)) {
+            std::string why;
+            if (!ShapingBucket(record.policy.shaping, wanted, why)) {
+                throw HostCtlException("Unable to set the MTU of virtual switch " + name + " to " +
+                                       std::to_string(mtu) + ": the shaping of uplink " + uplink +
+                                       " could not follow: " + why);
+            }
+        }
+    }
     // The uplinks carry the switch's frames: they take its MTU first, so that the bridge never
     // sends them a frame they cannot carry. A refusal puts back what was changed.
     std::vector<std::pair<std::string, unsigned>> changed;
@@ -605,6 +617,7 @@ void LinuxSwitches::SetMtu(const std::string& name, int mtu) {
         throw HostCtlException("The MTU of " + differs + " is not " + std::to_string(mtu) +
                                " after the MTU of virtual switch " + name + " was set");
     }
+    ApplyShaping(view, after, record);
 }
 
 void LinuxSwitches::SetCdpStatus(const std::string& name, std::uint32_t status) {
@@ -667,11 +680,13 @@ void LinuxSwitches::AddUplink(const std::string& name, const std::string& nic) {
         activate(group.policy.teaming);
 
     // The NIC takes the switch's MTU and joins the bridge with the switch's shaping; a step the
-    // kernel refuses puts back what was done.
+    // kernel refuses puts back what was done. (The view is read anew: keep what is needed of it.)
     const unsigned mtuBefore = link->mtu;
+    const int bridgeIndex = bridge.index;
+    const unsigned bridgeMtu = bridge.mtu;
     try {
-        if (link->mtu != bridge.mtu) Kernel::ChangeLink(own, nic, Mtu(bridge.mtu));
-        Kernel::ChangeLink(own, nic, Master(bridge.index));
+        if (mtuBefore != bridgeMtu) Kernel::ChangeLink(own, nic, Mtu(bridgeMtu));
+        Kernel::ChangeLink(own, nic, Master(bridgeIndex));
         view = Look();
         const auto& joined = Bridge(view, name);
         const auto* port = view.Find(nic);
@@ -689,7 +704,7 @@ void LinuxSwitches::AddUplink(const std::string& name, const std::string& nic) {
                     if (root.link == port->index && root.kind == "tbf")
                         Kernel::DeleteRootQdisc(own, port->index, nic);
                 }
-                if (port->master == bridge.index) Kernel::ChangeLink(own, nic, Master(0));
+                if (port->master == bridgeIndex) Kernel::ChangeLink(own, nic, Master(0));
                 if (port->mtu != mtuBefore) Kernel::ChangeLink(own, nic, Mtu(mtuBefore));
             }
         } catch (const HostCtlException&) {

@@ -42,7 +42,8 @@ bool SameBurst(std::uint32_t asked, std::uint32_t got, std::uint32_t rate) {
 
 bool SameBucket(const Kernel::TokenBucket& asked, const Kernel::TokenBucket& got) {
     return asked.rate == got.rate && asked.peakRate == got.peakRate &&
-           SameBurst(asked.burst, got.burst, asked.rate);
+           SameBurst(asked.burst, got.burst, asked.rate) &&
+           (asked.peakRate == 0 || SameBurst(asked.peakBucket, got.peakBucket, asked.peakRate));
 }
 
 }  // namespace

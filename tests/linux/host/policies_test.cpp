@@ -111,6 +111,11 @@ TEST_F(PoliciesTest, APortGroupOverridesItsSwitchOnItsOwnPorts) {
         "Allow Promiscuous":false,"Allow MAC Address Change":true,"Allow Forged Transmits":false,
         "Override Vswitch Allow Promiscuous":false,"Override Vswitch Allow MAC Address Change":false,
         "Override Vswitch Allow Forged Transmits":true})"));
+    ExpectRefused(
+        "network vswitch standard portgroup policy security set -p pg -o true",
+        "Unable to update the security policy of port group pg: promiscuous mode cannot be allowed on a "
+        "Linux bridge: it gives a port the frames addressed to the port and those it floods, never the "
+        "frames it forwards to other ports");
     EXPECT_EQ(Hadro("network vswitch standard portgroup policy security set -p pg -u").status, 0);
     EXPECT_EQ(Flags("vp0"), "on off off");
 

@@ -197,6 +197,7 @@ TEST(ShapingPolicies, WhatATokenBucketCannotDoIsRefused) {
         "dropped");
     std::string why;
     EXPECT_TRUE(ShapingBucket(Shaping(1000, 1000, 12), 1500, why)) << why;
+    EXPECT_EQ(refusal(Shaping(0, 1000, 100)), "an average bandwidth of 0 Kbps sends nothing");
     Net::ShapingPolicy partial;
     partial.SetEnabled(true);
     partial.SetAverageBps(1000);

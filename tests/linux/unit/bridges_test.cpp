@@ -171,8 +171,8 @@ TEST(BridgeRequests, PortVlansGoAsTheKernelReadsThemAndComeBackJoined) {
     EXPECT_EQ(static_cast<ifinfomsg*>(nlmsg_data(header))->ifi_family, AF_BRIDGE);
     Attrs top(header, sizeof(ifinfomsg), IFLA_MAX);
     ASSERT_TRUE(top.at[IFLA_AF_SPEC]);
-    Attrs spec(top.at[IFLA_AF_SPEC], IFLA_BRIDGE_MAX);
-    EXPECT_EQ(nla_get_u16(spec.at[IFLA_BRIDGE_FLAGS]), BRIDGE_FLAGS_MASTER);
+    Attrs afSpec(top.at[IFLA_AF_SPEC], IFLA_BRIDGE_MAX);
+    EXPECT_EQ(nla_get_u16(afSpec.at[IFLA_BRIDGE_FLAGS]), BRIDGE_FLAGS_MASTER);
     // Three entries: the range as its first and last VLAN, then VLAN 10.
     std::vector<bridge_vlan_info> sent;
     nlattr* entry = nullptr;

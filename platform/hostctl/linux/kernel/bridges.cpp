@@ -277,7 +277,7 @@ void ChangePortFlags(const Namespace& ns, int portIndex, const std::string& name
 
 nl_msg* BuildPortVlans(int portIndex, const std::vector<PortVlan>& vlans, bool add) {
     Message message = LinkRequest(add ? RTM_SETLINK : RTM_DELLINK, NLM_F_REQUEST, AF_BRIDGE, portIndex);
-    nlattr* spec = Nest(message.get(), IFLA_AF_SPEC);
+    nlattr* afSpec = Nest(message.get(), IFLA_AF_SPEC);
     Put(nla_put_u16(message.get(), IFLA_BRIDGE_FLAGS, BRIDGE_FLAGS_MASTER));
     for (const auto& vlan : vlans) {
         bridge_vlan_info info{};
@@ -296,7 +296,7 @@ nl_msg* BuildPortVlans(int portIndex, const std::vector<PortVlan>& vlans, bool a
             Put(nla_put(message.get(), IFLA_BRIDGE_VLAN_INFO, sizeof(info), &info));
         }
     }
-    nla_nest_end(message.get(), spec);
+    nla_nest_end(message.get(), afSpec);
     return message.release();
 }
 

@@ -10,6 +10,7 @@
 #include <nlohmann/json.hpp>
 
 #include "core/config.h"
+#include "network/pnic.h"
 #include "network/vswitch.h"
 
 namespace {
@@ -84,15 +85,15 @@ TEST(SwitchRecords, ADamagedMemberIsRefusedSayingWhere) {
 TEST(SwitchUplinks, ANicHasADeviceOrIsNamedByTheConfiguration) {
     const auto sysfs =
         std::filesystem::temp_directory_path() / ("hadro-switches-" + std::to_string(getpid()));
-    std::filesystem::create_directories(sysfs / "eno1" / "device");
-    std::filesystem::create_directories(sysfs / "veth7");
+    std::filesystem::create_directories(sysfs / "class/net/eno1/device");
+    std::filesystem::create_directories(sysfs / "class/net/veth7");
     const auto config = Config::Parse("nics = up? uplink-*\n", "test");
-    EXPECT_TRUE(IsSwitchUplinkNic(config, sysfs.string(), "eno1"));
-    EXPECT_FALSE(IsSwitchUplinkNic(config, sysfs.string(), "veth7"));
-    EXPECT_TRUE(IsSwitchUplinkNic(config, sysfs.string(), "up1"));
-    EXPECT_TRUE(IsSwitchUplinkNic(config, sysfs.string(), "uplink-a"));
-    EXPECT_FALSE(IsSwitchUplinkNic(config, sysfs.string(), "up12"));
-    EXPECT_FALSE(IsSwitchUplinkNic(config, sysfs.string(), "../eno1"));
+    EXPECT_TRUE(IsPhysicalNic(config, sysfs.string(), "eno1"));
+    EXPECT_FALSE(IsPhysicalNic(config, sysfs.string(), "veth7"));
+    EXPECT_TRUE(IsPhysicalNic(config, sysfs.string(), "up1"));
+    EXPECT_TRUE(IsPhysicalNic(config, sysfs.string(), "uplink-a"));
+    EXPECT_FALSE(IsPhysicalNic(config, sysfs.string(), "up12"));
+    EXPECT_FALSE(IsPhysicalNic(config, sysfs.string(), "../class/net/eno1"));
     std::filesystem::remove_all(sysfs);
 }
 

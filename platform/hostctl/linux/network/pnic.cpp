@@ -111,9 +111,12 @@ std::optional<Net::PnicLinkMode> ParseLinkModeName(const std::string& name) {
 
 LinuxNics::LinuxNics(Context& context, std::string sysfs) : context_(context), sysfs_(std::move(sysfs)) {}
 
+bool IsPhysicalNic(const Config& config, const std::string& sysfs, const std::string& name) {
+    return Kernel::HasNetDevice(sysfs, name) || config.NamesNic(name);
+}
+
 bool LinuxNics::IsNic(const Kernel::Link& link) const {
-    if (link.loopback) return false;
-    return Kernel::HasNetDevice(sysfs_, link.name) || context_.GetConfig().NamesNic(link.name);
+    return !link.loopback && IsPhysicalNic(context_.GetConfig(), sysfs_, link.name);
 }
 
 Kernel::Link LinuxNics::Require(const std::string& name) {

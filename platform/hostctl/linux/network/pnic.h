@@ -21,6 +21,11 @@
 
 namespace TknCtl::Linux {
 
+// Whether the interface of that name counts as a physical NIC: it is backed by a device in sysfs
+// (under the sysfs root given) or the configuration's "nics" line names it. The one test every
+// area uses (the NICs, the switches' uplinks).
+bool IsPhysicalNic(const Config& config, const std::string& sysfs, const std::string& name);
+
 class LinuxNics final : public Backend::Nics {
 public:
     // sysfs: the root of sysfs (tests give a tree of their own).

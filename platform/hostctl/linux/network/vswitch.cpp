@@ -2,6 +2,8 @@
 // and what the document keeps of them (network/vswitch.h says how).
 #include "network/vswitch.h"
 
+#include "network/pnic.h"
+
 #include <unistd.h>
 
 #include <algorithm>
@@ -340,11 +342,6 @@ std::string NicHolder(const std::vector<Kernel::BridgeLink>& links, const Kernel
     return {};
 }
 
-bool IsSwitchUplinkNic(const Config& config, const std::string& sysfsNet, const std::string& name) {
-    if (!IsDeviceName(name)) return false;
-    return access((sysfsNet + "/" + name + "/device").c_str(), F_OK) == 0 || config.NamesNic(name);
-}
-
 // ---------------------------------------------------------------- the area: looking
 
 LinuxSwitches::LinuxSwitches(Context& context) : context_(context) {}
@@ -376,7 +373,8 @@ LinuxSwitches::View LinuxSwitches::Look() const {
 }
 
 bool LinuxSwitches::IsNic(const Kernel::BridgeLink& link) const {
-    return !link.bridge && link.name != "lo" && IsSwitchUplinkNic(context_.GetConfig(), sysfsNet_, link.name);
+    return !link.bridge && link.name != "lo" && IsDeviceName(link.name) &&
+           IsPhysicalNic(context_.GetConfig(), sysfs_, link.name);
 }
 
 const Kernel::BridgeLink& LinuxSwitches::Bridge(const View& view, const std::string& name) const {

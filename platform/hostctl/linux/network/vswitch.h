@@ -106,10 +106,7 @@ bool IsDeviceName(const std::string& name);
 
 // ---------------------------------------------------------------- physical NICs
 
-// Whether the switches count an interface as a physical NIC: it has a device in sysfs
-// (sysfsNet/NAME/device) or the configuration's "nics" line names it. The one place this area
-// decides it, until the NIC area's own test serves every area.
-bool IsSwitchUplinkNic(const Config& config, const std::string& sysfsNet, const std::string& name);
+// (Which interfaces are physical NICs: IsPhysicalNic, network/pnic.h.)
 
 // Why a NIC cannot become a bridge port, whatever the bridge: it is a port of a master (a
 // bridge: another switch), or it carries a device that takes its frames before any bridge
@@ -242,7 +239,7 @@ private:
     bool HasBonding() const;
 
     Context& context_;
-    std::string sysfsNet_ = "/sys/class/net";
+    std::string sysfs_ = "/sys";
 };
 
 }  // namespace TknCtl::Linux

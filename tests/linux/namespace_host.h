@@ -25,6 +25,12 @@
 
 namespace Hadro::Test {
 
+// A file's whole content ("" when it cannot be read); whether text holds part.
+std::string Slurp(const std::string& path);
+inline bool Has(const std::string& text, const std::string& part) {
+    return text.find(part) != std::string::npos;
+}
+
 struct HostResult {
     int status = -1;  // exit status; -1 when the program did not end by itself
     std::string out;

@@ -6,12 +6,8 @@
 
 namespace {
 
-std::string Slurp(const std::string& path) {
-    std::ifstream in(path);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
-}
+using Hadro::Test::Has;
+using Hadro::Test::Slurp;
 
 class DnsTest : public Hadro::Test::NamespaceHostTest {};
 

@@ -8,18 +8,10 @@
 
 namespace {
 
+using Hadro::Test::Has;
+using Hadro::Test::Slurp;
+
 using nlohmann::json;
-
-std::string Slurp(const std::string& path) {
-    std::ifstream in(path);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
-}
-
-bool Has(const std::string& text, const std::string& part) {
-    return text.find(part) != std::string::npos;
-}
 
 // The record of a listing whose field has the value.
 json Record(const json& list, const std::string& field, const std::string& value) {

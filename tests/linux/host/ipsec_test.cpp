@@ -7,14 +7,10 @@
 
 namespace {
 
-using nlohmann::json;
+using Hadro::Test::Has;
+using Hadro::Test::Slurp;
 
-std::string Slurp(const std::string& path) {
-    std::ifstream in(path);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
-}
+using nlohmann::json;
 
 // A policy as `ip xfrm policy` prints it (it has no JSON output for xfrm).
 struct Printed {

@@ -6,11 +6,10 @@
 
 namespace {
 
-using nlohmann::json;
+using Hadro::Test::Has;
+using Hadro::Test::Slurp;
 
-bool Has(const std::string& text, const std::string& part) {
-    return text.find(part) != std::string::npos;
-}
+using nlohmann::json;
 
 class RoutesTest : public Hadro::Test::NamespaceHostTest {
 protected:

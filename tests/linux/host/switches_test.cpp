@@ -8,14 +8,10 @@
 
 namespace {
 
-using nlohmann::json;
+using Hadro::Test::Has;
+using Hadro::Test::Slurp;
 
-std::string Slurp(const std::string& path) {
-    std::ifstream in(path);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
-}
+using nlohmann::json;
 
 class SwitchesTest : public Hadro::Test::NamespaceHostTest {
 protected:

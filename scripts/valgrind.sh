@@ -24,9 +24,9 @@ lines="$work/lines"
 network ip interface list
 --formatter=json network ip interface ipv4 get
 --formatter=table network ip interface ipv6 address list
-network ip interface add -i vmk9 -p Management Network
-network ip interface ipv4 set -i vmk1 -t static -I 10.20.30.9 -N 255.255.255.0
-network ip interface tag add -i vmk1 -t VMotion
+network ip interface add -i tkn9 -p Management Network
+network ip interface ipv4 set -i tkn1 -t static -I 10.20.30.9 -N 255.255.255.0
+network ip interface tag add -i tkn1 -t Glidex
 network ip route ipv4 add -n 10.99.0.0/16 -g 10.20.30.1
 network ip route ipv4 list
 network ip dns server add -s 10.0.0.99
@@ -53,7 +53,7 @@ network vswitch dvs talvex lacp status get
 network port stats get -p 33554436
 network vm list
 network vm port list -w 2110598
-network ip interface add -i vmk1 -p Nowhere
+network ip interface add -i tkn1 -p Nowhere
 network nic get -n vmnic99
 network ip route ipv4 add -n not-a-network -g 10.20.30.1
 network vswitch standard set -v vSwitch0 -m 99999999999999999999

@@ -73,8 +73,8 @@ TEST_F(IpTest, ConnectionsAreListedTcpThenUdpThenIp) {
     EXPECT_EQ(Rows("network ip connection list -t tcp", {"Local Address", "Foreign Address", "CC Algo"})[2],
               "192.0.2.10:22 198.51.100.77:51234 newreno");
     EXPECT_EQ(Rows("network ip connection list -t udp -N glidex", {"Proto"}), Strings{});
-    EXPECT_EQ(Rows("network ip connection list -N glidex", {"Send Q", "State", "World ID"}),
-              (Strings{"0 LISTEN 2097733", "131072 ESTABLISHED 2097733"}));
+    EXPECT_EQ(Rows("network ip connection list -N glidex", {"Send Q", "State", "World ID", "World Name"}),
+              (Strings{"0 LISTEN 2097733 hadrod", "131072 ESTABLISHED 2097733 hadrod"}));
 
     // States beyond TIME_WAIT have no name; SYN_RCVD is shown as RCVD.
     EditHost([](nlohmann::json& doc) {

@@ -75,15 +75,15 @@ TEST_F(NetstackTest, GetOfAnUnknownKeyNamesIt) {
 
 TEST_F(NetstackTest, AddCreatesInTheKernelOrInTheConfigurationOnly) {
     StartJournal();
-    auto r = Run("network ip netstack add --netstack vmotion2");
+    auto r = Run("network ip netstack add --netstack glidex2");
     EXPECT_EQ(r.status, 0) << r.err;
     EXPECT_EQ(r.out, "");
     EXPECT_EQ(
         Journal("TknCtl::Network::NetworkInfoImpl::AddNetstackInstance"),
-        std::vector<std::string>{"TknCtl::Network::NetworkInfoImpl::AddNetstackInstance vmotion2 false"});
-    auto added = Netstack("vmotion2");
+        std::vector<std::string>{"TknCtl::Network::NetworkInfoImpl::AddNetstackInstance glidex2 false"});
+    auto added = Netstack("glidex2");
     EXPECT_EQ(added["state"], 4660);
-    EXPECT_EQ(added["name"], "vmotion2");
+    EXPECT_EQ(added["name"], "glidex2");
     EXPECT_EQ(added["maxConnections"], 11000);
     EXPECT_EQ(added["currentMaxConnections"], 11000);
     EXPECT_EQ(added["congestionControl"], "newreno");

@@ -1,6 +1,6 @@
 // libFuzzer target: the state document loader. Any bytes given as a state document are
 // either refused with StateFileError or accepted; an accepted document, written back in the
-// canonical form, is accepted again and writes back to the same text.
+// canonical form, is accepted again, its digests hold, and it writes back to the same text.
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -18,6 +18,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     std::string canonical;
     try {
         TknCtl::Lib::Store store(text, "fuzz");
+        static_cast<void>(store.Verify());
         store.LoadAll();
         store.RewriteAll();
         canonical = store.Export();
@@ -33,6 +34,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     }
     try {
         TknCtl::Lib::Store again(canonical, "canonical");
+        if (!again.Verify()) __builtin_trap();  // written with digests that do not hold
         again.LoadAll();
         again.RewriteAll();
         if (again.Export() != canonical) __builtin_trap();

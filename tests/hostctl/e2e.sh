@@ -150,20 +150,45 @@ damage() {
     wrong-type) sed 's/"name":"vmnic0"/"name":7/' "$canonical" >"$D" ;;
     inconsistent) sed 's/"name":"vmnic1"/"name":"vmnic0"/' "$canonical" >"$D" ;;
     dangling) sed 's/"ownerWorldId":2110598/"ownerWorldId":42/' "$canonical" >"$D" ;;
+    # Damage in a section the commands below never touch.
+    switch-bad-json) sed 's/^"vswitches":\[/"vswitches":[1,,/' "$canonical" >"$D" ;;
+    switch-twice) sed 's/"name":"vSwitch1"/"name":"vSwitch0"/' "$canonical" >"$D" ;;
+    port-dangling) sed 's/"worldId":2110231/"worldId":42/' "$canonical" >"$D" ;;
     esac
 }
 for kind in empty blank truncated truncated-end garbage binary version no-version unknown-section bad-json \
-    wrong-type inconsistent dangling; do
+    wrong-type inconsistent dangling switch-bad-json switch-twice port-dangling; do
     damage $kind
     cp "$D" "$work/damaged.copy"
     t "hadrosim refuses a $kind state file with status 3" exits_with 3 "$SIM" --state="$D" fault add X
     t "... in one line naming the file ($kind)" one_line_naming "$D"
     t "hadrocli refuses a $kind state file with status 3" exits_with 3 cli --state="$D" simtest touch --mode read
     t "... in one line naming the file ($kind)" one_line_naming "$D"
+    t "hadrocli refuses to change a $kind state file" exits_with 3 cli --state="$D" simtest touch --mode ok
+    t "... in one line naming the file ($kind)" one_line_naming "$D"
     t "... and leaves it byte for byte ($kind)" same_file "$D" "$work/damaged.copy"
     t "hadrosim refuses to import a $kind document" exits_with 3 "$SIM" --state="$C" import "$work/damaged.copy"
 done
 t "a refused import leaves the state alone" same_file "$work/before" "$C"
+damage switch-twice
+exits_with 3 cli --state="$D" simtest touch --mode ok
+t "the fault is named" grep -qF "vswitches: duplicate switch name 'vSwitch0'" "$work/err"
+
+# ---- hand edits that keep the document valid are taken ----
+H=$work/hand/host.json
+"$SIM" --state="$H" reset
+sed -i 's/"mtu":1500,"cdpStatus"/"mtu":9000,"cdpStatus"/' "$H"
+t "a valid hand edit is taken" exits_with 0 cli --state="$H" simtest touch --mode ok
+t "... and kept by the change" grep -q '"mtu":9000,"cdpStatus"' "$H"
+t "... and hadrosim takes it too" exits_with 0 "$SIM" --state="$H" fault add After::Edit
+sed -i -e '/^"digests":/d' -e 's/^\("journal":.*\),$/\1/' "$H"
+t "a document without digests is taken" exits_with 0 cli --state="$H" simtest touch --mode ok
+t "... and written back with them" grep -q '^"digests":{"pnics":"[0-9a-f]\{16\}",' "$H"
+"$SIM" --state="$H" export | sed 's/"mtu":9000,"cdpStatus"/"mtu":1600,"cdpStatus"/' >"$work/edited.json"
+t "an exported document edited by hand imports" exits_with 0 "$SIM" --state="$H" import "$work/edited.json"
+"$SIM" --state="$H" export >"$work/export.json"
+t "... and exports as the state file it became" same_file "$work/export.json" "$H"
+t "... with the edit" grep -q '"mtu":1600,"cdpStatus"' "$H"
 mkdir -p "$work/dir-state"
 t "a directory is no state file" exits_with 3 cli --state="$work/dir-state" simtest touch --mode read
 : >"$work/not-a-dir"

@@ -9,7 +9,11 @@
 #include <sstream>
 #include <string>
 
+#include <nlohmann/json.hpp>
+
+#include "core/digest.h"
 #include "core/section.h"
+#include "core/store.h"
 #include "hostctl/exception.h"
 #include "hostctl/session.h"
 #include "model/faults.h"
@@ -62,6 +66,21 @@ protected:
     fs::path dir_;
 };
 
+// text with the first occurrence of from replaced by to (which must be there).
+std::string Edited(std::string text, const std::string& from, const std::string& to) {
+    const auto at = text.find(from);
+    EXPECT_NE(at, std::string::npos) << from;
+    if (at != std::string::npos) text.replace(at, from.size(), to);
+    return text;
+}
+
+// The line of a document as the library writes it that holds the section.
+std::string SectionLine(const std::string& document, const std::string& section) {
+    const auto begin = document.find("\n\"" + section + "\":");
+    if (begin == std::string::npos) return "";
+    return document.substr(begin + 1, document.find('\n', begin + 1) - begin - 1);
+}
+
 struct Fingerprint {
     ino_t inode;
     timespec mtime;
@@ -109,6 +128,14 @@ TEST(Document, ScanRefusesDamagedText) {
         {R"({"version":1 "ipsettings":{}})", "expected ',' or '}'"},
         {R"({"version":1,})", "expected a section name"},
         {R"({"version":1,"ipsettings":})", "missing value"},
+        {R"({"version":1,"digests":[]})", "\"digests\": expected an object"},
+        {R"({"version":1,"digests":{},"digests":{}})", "\"digests\" appears twice"},
+        {R"({"version":1,"digests":{"nosuch":"0123456789abcdef"}})", "\"digests\": unknown section 'nosuch'"},
+        {R"({"version":1,"digests":{"ens":"0123456789ABCDEF"}})", "'ens': expected 16 hexadecimal digits"},
+        {R"({"version":1,"digests":{"ens":"0123456789abcdef","ens":"0123456789abcdef"}})",
+         "'ens' appears twice"},
+        {R"({"version":1,"digests":{"ens" "0123456789abcdef"}})", "expected ':' after 'ens'"},
+        {R"({"version":1,"digests":{"ens":"0123456789abcdef" "x"}})", "expected ',' or '}' after 'ens'"},
     };
     for (const auto& c : cases) {
         std::string message = Refusal(c.text);
@@ -224,6 +251,40 @@ TEST(Document, ExportRoundTripsAndOnlyRealChangesCount) {
     EXPECT_EQ(Read<Model::PnicsSection>().nics[0].mtu, 9000u);
 }
 
+TEST(Document, DigestsTellTheLibrarysSectionsFromEditedOnes) {
+    const std::string written = HostSession::InMemoryDefault()->Export();
+    const auto verified = [](const std::string& text) { return TknCtl::Lib::Store(text, "test").Verify(); };
+    EXPECT_TRUE(verified(written));
+    const std::string digests = SectionLine(written, "digests");
+    const std::string ens = SectionLine(written, "ens");
+    ASSERT_FALSE(digests.empty());
+    ASSERT_FALSE(ens.empty());
+    const std::string ensDigest =
+        "\"ens\":\"" + nlohmann::json::parse(written)["digests"]["ens"].get<std::string>() + "\"";
+    // One byte of a section changed; a section gone, its digest kept; a section without a
+    // digest; no digests at all (by hand, or an older version); a digest of another text.
+    EXPECT_FALSE(verified(Edited(written, "\"mtu\":1500", "\"mtu\":1501")));
+    EXPECT_FALSE(verified(Edited(written, "\n" + ens, "")));
+    EXPECT_FALSE(verified(Edited(written, ensDigest + ",", "")));
+    EXPECT_FALSE(verified(Edited(written, ",\n" + digests, "")));
+    EXPECT_FALSE(verified(Edited(written, ensDigest, "\"ens\":\"0123456789abcdef\"")));
+    // Text outside the sections may change.
+    EXPECT_TRUE(verified(Edited(written, "\n\"ens\":", "\n  \"ens\" : ")));
+
+    // The digest depends on every byte, wherever it falls, and on the length.
+    const std::string bytes(300, 'a');
+    const std::uint64_t digest = TknCtl::Lib::Digest(bytes);
+    for (std::size_t at = 0; at < bytes.size(); at += 7) {
+        std::string changed = bytes;
+        changed[at] = 'b';
+        EXPECT_NE(TknCtl::Lib::Digest(changed), digest) << at;
+    }
+    EXPECT_NE(TknCtl::Lib::Digest(bytes + '\0'), digest);
+    // ...and on nothing else: documents move between machines.
+    EXPECT_EQ(TknCtl::Lib::DigestText(TknCtl::Lib::Digest("{\"ipv6Enabled\":true}")), "ddb5d6327c2f28f1");
+    EXPECT_EQ(TknCtl::Lib::ParseDigest(TknCtl::Lib::DigestText(digest)), digest);
+}
+
 TEST(Session, OneAtATimeAndNeededByTheModel) {
     EXPECT_EQ(HostSession::Current(), nullptr);
     EXPECT_THROW(Read<Model::PnicsSection>(), HostCtlException);
@@ -319,15 +380,13 @@ TEST_F(TempDir, DamagedFilesAreRefusedAndLeftAlone) {
     fs::path path = dir_ / "host.json";
     const std::string damaged = R"({"version":1,"pnics":[{"name":"vmnic0"},{"name":"vmnic0"}]})";
     Spill(path, damaged);
-    {
-        auto session = HostSession::OpenFile(path);  // the scan passes
-        try {
-            Read<Model::PnicsSection>();
-            FAIL() << "duplicate NIC names accepted";
-        } catch (const StateFileError& e) {
-            EXPECT_EQ(std::string(e.what()),
-                      "state file " + path.string() + ": pnics: duplicate NIC name 'vmnic0'");
-        }
+    try {
+        // Written by hand (no digests): checked in full before it is used.
+        HostSession::OpenFile(path);
+        FAIL() << "duplicate NIC names accepted";
+    } catch (const StateFileError& e) {
+        EXPECT_EQ(std::string(e.what()),
+                  "state file " + path.string() + ": pnics: duplicate NIC name 'vmnic0'");
     }
     EXPECT_EQ(Slurp(path), damaged);
     Spill(path, "{\"version\":1,");
@@ -347,6 +406,65 @@ TEST_F(TempDir, DamagedFilesAreRefusedAndLeftAlone) {
         session->Commit();
     }
     EXPECT_EQ(Slurp(path), HostSession::InMemoryDefault()->Export());
+}
+
+TEST_F(TempDir, ASectionEditedOutsideTheLibraryIsCheckedBeforeTheFileIsUsed) {
+    fs::path path = dir_ / "host.json";
+    HostSession::OpenFile(path)->Commit();
+    const std::string written = Slurp(path);
+    // Damage where the session never looks is refused all the same, before anything runs,
+    // and the file is left byte for byte.
+    struct Damage {
+        std::string from, to, fault;
+    } damages[] = {
+        {"\"vswitches\":[", "\"vswitches\":[1,,", "vswitches: not valid JSON"},
+        {"\"name\":\"vSwitch1\"", "\"name\":\"vSwitch0\"", "vswitches: duplicate switch name 'vSwitch0'"},
+        {"\"worldId\":2110231", "\"worldId\":42", "ports: port 33554437: unknown world 42"},
+    };
+    for (const auto& d : damages) {
+        const std::string damaged = Edited(written, d.from, d.to);
+        Spill(path, damaged);
+        try {
+            auto session = HostSession::OpenFile(path);
+            Write<Model::IpSettingsSection>().ipv6Enabled = false;
+            session->Commit();
+            ADD_FAILURE() << "accepted: " << d.to;
+        } catch (const StateFileError& e) {
+            EXPECT_NE(std::string(e.what()).find("state file " + path.string() + ": " + d.fault),
+                      std::string::npos)
+                << e.what();
+        }
+        EXPECT_EQ(Slurp(path), damaged);
+        EXPECT_EQ(HostSession::Current(), nullptr);
+    }
+    // A valid hand edit is taken. At the next commit the edited section gets its digest, a
+    // changed one a new one, and the others keep theirs.
+    const std::string edited = Edited(written, "\"mtu\":1500,\"cdpStatus\"", "\"mtu\":9000,\"cdpStatus\"");
+    Spill(path, edited);
+    {
+        auto session = HostSession::OpenFile(path);
+        Write<Model::IpSettingsSection>().ipv6Enabled = false;
+        session->Commit();
+    }
+    const std::string after = Slurp(path);
+    EXPECT_EQ(SectionLine(after, "vswitches"), SectionLine(edited, "vswitches"));
+    const auto before = nlohmann::json::parse(written)["digests"];
+    const auto now = nlohmann::json::parse(after)["digests"];
+    EXPECT_NE(now["vswitches"], before["vswitches"]);
+    EXPECT_NE(now["ipsettings"], before["ipsettings"]);
+    EXPECT_EQ(now.size(), before.size());
+    for (const auto& section : {"pnics", "dvswitches", "ports", "journal"})
+        EXPECT_EQ(now[section], before[section]) << section;
+    EXPECT_TRUE(TknCtl::Lib::Store(after, "test").Verify());
+    // Without any digests (by hand, or from an older version): checked, taken, and written
+    // back with them at the next change.
+    Spill(path, Edited(written, ",\n" + SectionLine(written, "digests"), ""));
+    {
+        auto session = HostSession::OpenFile(path);
+        Write<Model::IpSettingsSection>().ipv6Enabled = false;
+        session->Commit();
+    }
+    EXPECT_TRUE(TknCtl::Lib::Store(Slurp(path), "test").Verify());
 }
 
 TEST_F(TempDir, LockFileIsNotFollowedThroughASymlink) {

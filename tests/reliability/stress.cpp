@@ -487,7 +487,8 @@ int Concurrency(const Options& opt) {
                 if (!owned) nics.push_back(nic);
             }
             d["tknnics"] = nics;
-            d.erase("ports");  // an interface takes a port of its switch
+            d.erase("ports");    // an interface takes a port of its switch
+            d.erase("digests");  // they follow the sections
             return d;
         };
         if (strip(doc) != strip(initial)) fault("the final state holds changes that no writer reported");

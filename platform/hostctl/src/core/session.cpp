@@ -296,6 +296,10 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, Open
         impl->store->RewriteAll();
     } else {
         impl->store = std::make_unique<Store>(std::move(text), Origin(path));
+        // A section edited outside the library (or damaged) may break what other sections
+        // rely on: the whole document is checked now, before any command can act on it or
+        // write it back.
+        if (!impl->store->Verify()) impl->store->LoadAll();
     }
     return std::unique_ptr<HostSession>(new HostSession(std::move(impl)));
 }

@@ -8,6 +8,7 @@
 #include <emmintrin.h>
 #endif
 
+#include "core/digest.h"
 #include "core/text.h"
 #include "hostctl/exception.h"
 #include "hostctl/session.h"
@@ -265,6 +266,7 @@ void Store::Scan() {
     if (scan.Peek() != '{') Refuse("not a state document (it does not begin with '{')");
     ++scan.pos;
     bool versionSeen = false;
+    std::optional<std::string_view> digests;
     std::string current = "the document";
     auto truncated = [&] { Refuse("truncated document (it ends inside " + current + ")"); };
     scan.SkipBlanks();
@@ -297,6 +299,9 @@ void Store::Scan() {
                     Refuse("unsupported version " + Quote(value) + " (this program reads version " +
                            std::to_string(kDocumentVersion) + ")");
                 }
+            } else if (key == "digests") {
+                if (digests) Refuse("\"digests\" appears twice");
+                digests = text_.substr(valueStart, valueEnd - valueStart);
             } else {
                 Slot* slot = nullptr;
                 for (auto& candidate : slots_) {
@@ -326,6 +331,67 @@ void Store::Scan() {
     scan.SkipBlanks();
     if (!scan.AtEnd()) Refuse("unexpected text after the document at byte " + std::to_string(scan.pos));
     if (!versionSeen) Refuse("the document has no \"version\"");
+    if (digests) ReadDigests(*digests);
+}
+
+// The value of "digests": an object whose members name sections and give their digests.
+// (The scan has found where it ends: its brackets match and its strings end.)
+void Store::ReadDigests(std::string_view member) {
+    std::size_t at = 0;
+    auto fail = [&](const std::string& what) { Refuse("\"digests\": " + what); };
+    auto blanks = [&] {
+        while (at < member.size() &&
+               (member[at] == ' ' || member[at] == '\t' || member[at] == '\n' || member[at] == '\r'))
+            ++at;
+    };
+    // A string without escapes (no section name and no digest has any).
+    auto text = [&](const char* what) {
+        blanks();
+        if (at >= member.size() || member[at] != '"') fail(std::string("expected ") + what);
+        const std::size_t begin = ++at;
+        while (at < member.size() && member[at] != '"' && member[at] != '\\')
+            ++at;
+        if (at >= member.size() || member[at] != '"') fail(std::string("expected ") + what);
+        return member.substr(begin, at++ - begin);
+    };
+    blanks();
+    if (at >= member.size() || member[at] != '{') fail("expected an object");
+    ++at;
+    blanks();
+    if (at < member.size() && member[at] == '}') return;
+    while (true) {
+        const std::string_view name = text("a section name");
+        blanks();
+        if (at >= member.size() || member[at] != ':') fail("expected ':' after " + Quote(name));
+        ++at;
+        const std::string_view value = text("a digest");
+        Slot* slot = nullptr;
+        for (auto& candidate : slots_) {
+            if (name == candidate.kind->Name()) slot = &candidate;
+        }
+        if (!slot) fail("unknown section " + Quote(name));
+        if (slot->recorded) fail(Quote(name) + " appears twice");
+        slot->recorded = ParseDigest(value);
+        if (!slot->recorded) fail(Quote(name) + ": expected 16 hexadecimal digits, not " + Quote(value));
+        blanks();
+        if (at < member.size() && member[at] == ',') {
+            ++at;
+            continue;
+        }
+        if (at < member.size() && member[at] == '}') break;
+        fail("expected ',' or '}' after " + Quote(name));
+    }
+}
+
+bool Store::Verify() {
+    for (auto& slot : slots_) {
+        if (slot.present != slot.recorded.has_value()) return false;
+        if (!slot.present || slot.digest) continue;
+        const std::uint64_t digest = Digest(Raw(slot));
+        if (digest != *slot.recorded) return false;
+        slot.digest = digest;
+    }
+    return true;
 }
 
 Store::Slot& Store::SlotOf(const SectionKind& kind) {
@@ -411,29 +477,43 @@ bool Store::Differs(const Snapshot& snapshot) const {
 Store::Snapshot Store::TakeSnapshot() const {
     Snapshot snapshot;
     snapshot.serialized.resize(slots_.size());
+    snapshot.digests.resize(slots_.size());
     snapshot.names.reserve(slots_.size());
     snapshot.pieces.push_back(kHeader);
+    snapshot.digestsMember = ",\n\"digests\":{";
     for (std::size_t i = 0; i < slots_.size(); ++i) {
         const auto& slot = slots_[i];
         std::string_view content;
         if (slot.data && slot.dirty) {
             snapshot.serialized[i] = slot.kind->Serialize(*slot.data);
             content = *snapshot.serialized[i];
+            snapshot.digests[i] = Digest(content);
         } else if (slot.present) {
+            // Unchanged: the digest it was read with, unless it had none that held.
             content = Raw(slot);
+            snapshot.digests[i] = slot.digest ? *slot.digest : Digest(content);
         } else {
             continue;
         }
         snapshot.names.push_back(",\n\"" + std::string(slot.kind->Name()) + "\":");
         snapshot.pieces.push_back(snapshot.names.back());
         snapshot.pieces.push_back(content);
+        if (snapshot.digestsMember.back() != '{') snapshot.digestsMember += ',';
+        snapshot.digestsMember += '"';
+        snapshot.digestsMember += slot.kind->Name();
+        snapshot.digestsMember += "\":\"";
+        snapshot.digestsMember += DigestText(*snapshot.digests[i]);
+        snapshot.digestsMember += '"';
     }
+    snapshot.digestsMember += '}';
+    snapshot.pieces.push_back(snapshot.digestsMember);
     snapshot.pieces.push_back(kTrailer);
     return snapshot;
 }
 
 void Store::Committed(Snapshot snapshot) {
     for (std::size_t i = 0; i < slots_.size(); ++i) {
+        if (snapshot.digests[i]) slots_[i].digest = snapshot.digests[i];
         if (!snapshot.serialized[i]) continue;
         slots_[i].committed = std::make_unique<std::string>(std::move(*snapshot.serialized[i]));
         slots_[i].present = true;
@@ -470,8 +550,14 @@ void Store::Rebase(std::string text) {
         slot.present = false;
         slot.dirty = false;
         slot.committed.reset();
+        slot.recorded.reset();
+        slot.digest.reset();
     }
     Scan();
+    // The text is this store's own export: its digests hold.
+    for (auto& slot : slots_) {
+        if (slot.present) slot.digest = slot.recorded;
+    }
 }
 
 }  // namespace TknCtl::Lib

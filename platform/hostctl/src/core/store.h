@@ -1,7 +1,13 @@
 // The state document of a session: its text, the byte range of each top-level section, and
 // the sections parsed so far.
+//
+// A document as this library writes it ends with a member "digests" that gives the digest
+// (core/digest.h) of each section's bytes: {"pnics":"0123456789abcdef",...}. A section whose
+// bytes still have their digest is as the library wrote it, after checking it. One that has
+// none, or another, was written by hand or damaged: see Verify.
 #pragma once
 
+#include <cstdint>
 #include <cstdlib>
 #include <memory>
 #include <optional>
@@ -29,8 +35,9 @@ struct FileText {
 class Store {
 public:
     // Scans text: it must be one complete JSON object whose members are "version" (equal to
-    // kDocumentVersion) and known sections, each at most once. Sections are not parsed yet.
-    // Throws HostCtl::Lib::StateFileError whose message begins with origin.
+    // kDocumentVersion), known sections and "digests" (of known sections), each at most once.
+    // Sections are not parsed yet. Throws HostCtl::Lib::StateFileError whose message begins
+    // with origin.
     Store(std::string text, std::string origin);
     Store(FileText text, std::string origin);
 
@@ -45,6 +52,11 @@ public:
     const SectionData& Parsed(const SectionKind& kind);
     // Parses and checks every section.
     void LoadAll();
+    // True when every section has the digest the document gives for it (and the document
+    // gives none for a section it does not have): the document is as the library wrote it.
+    // Else something was edited outside the library, and since the checks of one section
+    // look into others, the whole document must be checked (LoadAll) before it is used.
+    bool Verify();
     // Marks every section changed so that the next export writes all of them in the
     // canonical form.
     void RewriteAll();
@@ -55,7 +67,9 @@ public:
     // make it up (they stay valid while the snapshot and this store are unchanged).
     struct Snapshot {
         std::vector<std::optional<std::string>> serialized;  // per section, when re-serialised
+        std::vector<std::optional<std::uint64_t>> digests;   // per section, when written
         std::vector<std::string> names;                      // the text before each section
+        std::string digestsMember;                           // the "digests" member
         std::vector<std::string_view> pieces;
     };
     Snapshot TakeSnapshot() const;
@@ -81,6 +95,8 @@ private:
         bool checked = false;  // data has passed (or is passing) the section's checks
         std::unique_ptr<SectionData> data;
         std::unique_ptr<std::string> committed;  // the section's text since the last commit
+        std::optional<std::uint64_t> recorded;   // the digest the document gives for it
+        std::optional<std::uint64_t> digest;     // the digest of its text, when known
     };
 
     Slot& SlotOf(const SectionKind& kind);
@@ -93,6 +109,7 @@ private:
     std::string_view Raw(const Slot& slot) const;
 
     void Scan();
+    void ReadDigests(std::string_view member);
     [[noreturn]] void Refuse(const std::string& fault) const;
 
     std::string owned_;  // the text, when it came as a string

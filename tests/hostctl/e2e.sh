@@ -197,6 +197,36 @@ damage garbage
 t "reset repairs a damaged state file" "$SIM" --state="$D" reset
 t "... to the default host" same_file "$D" "$canonical"
 
+# ---- state paths that are not regular files ----
+P=$work/paths
+mkdir -p "$P/real" "$P/links"
+mkfifo "$P/fifo.json"
+# A FIFO would block a reader that opened it; timeout makes that a failure here.
+t "hadrocli refuses a FIFO at once" exits_with 3 timeout 20 "$CLI" --plugin-dir="$PLUGINS" --state="$P/fifo.json" \
+    simtest touch --mode read
+t "... in one line saying why" one_line_naming "$P/fifo.json: not a regular file (it is a FIFO)"
+t "hadrosim refuses a FIFO at once" exits_with 3 timeout 20 "$SIM" --state="$P/fifo.json" fault list
+t "... and so does hadrosim reset" exits_with 3 timeout 20 "$SIM" --state="$P/fifo.json" reset
+t "... which leaves it as it is" [ -p "$P/fifo.json" ]
+"$SIM" --state="$P/real/host.json" reset
+ln -s ../real/host.json "$P/links/one.json"
+ln -s one.json "$P/links/two.json"
+ln -s "$P/links/two.json" "$P/abs.json"
+t "a change through a chain of symbolic links" exits_with 0 cli --state="$P/abs.json" simtest touch --mode ok
+t "... changes the file at its end" grep -q '"ipsettings":{"ipv6Enabled":false}' "$P/real/host.json"
+t "... and keeps every link" [ -L "$P/abs.json" ] && [ -L "$P/links/one.json" ] && [ -L "$P/links/two.json" ]
+t "... locking the file at its end" [ -f "$P/real/host.json.lock" ] && [ ! -e "$P/abs.json.lock" ]
+t "hadrosim reset through a link" "$SIM" --state="$P/links/two.json" reset
+t "... keeps the link and resets its target" [ -L "$P/links/two.json" ] && same_file "$P/real/host.json" "$canonical"
+ln -s nowhere.json "$P/dangling.json"
+t "hadrocli refuses a dangling link" exits_with 3 cli --state="$P/dangling.json" simtest touch --mode read
+t "... in one line naming its target" one_line_naming "$P/dangling.json: a symbolic link to $P/nowhere.json, which does not exist"
+t "hadrosim reset refuses it too" exits_with 3 "$SIM" --state="$P/dangling.json" reset
+t "... creating nothing" [ ! -e "$P/nowhere.json" ] && [ ! -e "$P/nowhere.json.lock" ] && [ -L "$P/dangling.json" ]
+ln -s loop.json "$P/loop.json"
+t "a loop of links is refused" exits_with 3 cli --state="$P/loop.json" simtest touch --mode read
+t "... in one line" one_line_naming "too many levels of symbolic links"
+
 # ---- several writers at once lose nothing (the lock) ----
 L=$work/lock/host.json
 "$SIM" --state="$L" reset

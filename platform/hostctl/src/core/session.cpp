@@ -155,6 +155,48 @@ std::string ReadFile(int fd, std::size_t expected, TknCtl::Lib::FileText& out) {
     return {};
 }
 
+// Why a file that is not a regular file cannot be the state file.
+std::string NotRegular(mode_t mode) {
+    const char* kind = S_ISDIR(mode)    ? "a directory"
+                       : S_ISFIFO(mode) ? "a FIFO"
+                       : S_ISSOCK(mode) ? "a socket"
+                       : S_ISCHR(mode)  ? "a character device"
+                       : S_ISBLK(mode)  ? "a block device"
+                                        : "of an unknown type";
+    return std::string("not a regular file (it is ") + kind + ")";
+}
+
+// The file a state path names: the path itself, or the end of the chain of symbolic links
+// it starts (a relative link leads from the directory the link is in). A link that leads
+// nowhere is refused: the state would be created somewhere the user did not mean.
+std::string LinkTarget(const std::string& path) {
+    constexpr int kMaxLinks = 40;  // as the system follows them
+    std::string current = path;
+    for (int links = 0;; ++links) {
+        struct stat info {};
+        if (lstat(current.c_str(), &info) != 0) {
+            if (links > 0 && (errno == ENOENT || errno == ENOTDIR)) {
+                Fail(path, "a symbolic link to " + current + ", which does not exist");
+            }
+            return current;  // missing, or a fault the open reports
+        }
+        if (!S_ISLNK(info.st_mode)) return current;
+        if (links == kMaxLinks) Fail(path, "too many levels of symbolic links");
+        std::string link(static_cast<std::size_t>(info.st_size > 0 ? info.st_size : 255) + 1, '\0');
+        while (true) {
+            ssize_t length = readlink(current.c_str(), link.data(), link.size());
+            if (length < 0) Fail(path, "cannot read the symbolic link " + current + ": " + ErrnoText(errno));
+            if (static_cast<std::size_t>(length) < link.size()) {
+                link.resize(static_cast<std::size_t>(length));
+                break;
+            }
+            link.resize(link.size() * 2);  // it grew since lstat
+        }
+        if (link.empty()) Fail(path, "the symbolic link " + current + " is empty");
+        current = link[0] == '/' ? link : DirectoryOf(current) + "/" + link;
+    }
+}
+
 }  // namespace
 
 std::string ResolveStatePath(const std::string& given) {
@@ -181,7 +223,8 @@ std::string ResolveStatePath(const std::string& given) {
 struct HostSession::Impl {
     std::unique_ptr<Store> store;                     // the simulated host
     std::unique_ptr<TknCtl::Backend::Host> realHost;  // a real host
-    std::string path;                                 // empty in memory
+    std::string path;                                 // as given; empty in memory
+    std::string target;                               // the file path names, through its symbolic links
     int lockFd = -1;
     bool mustWrite = false;  // the file does not exist yet
     bool existed = false;
@@ -249,46 +292,59 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, Open
     if (path.empty()) throw StateFileError("no state file given");
     auto impl = std::make_unique<Impl>();
     impl->path = path;
+    // A symbolic link stays: the file it leads to is locked, read and replaced.
+    impl->target = LinkTarget(path);
+    const std::string& target = impl->target;
 
-    MakeDirectories(DirectoryOf(path), path);
-    std::string lockPath = path + ".lock";
-    impl->lockFd = open(lockPath.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600);
+    // Anything but a regular file is refused before anything is created or opened: opening a
+    // FIFO waits for a writer, a device may do something of its own.
+    struct stat info {};
+    if (lstat(target.c_str(), &info) == 0 && !S_ISREG(info.st_mode)) Fail(path, NotRegular(info.st_mode));
+
+    MakeDirectories(DirectoryOf(target), path);
+    std::string lockPath = target + ".lock";
+    impl->lockFd = open(lockPath.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0600);
     if (impl->lockFd < 0) Fail(path, "cannot open lock file " + lockPath + ": " + ErrnoText(errno));
+    if (fstat(impl->lockFd, &info) != 0 || !S_ISREG(info.st_mode))
+        Fail(path, "lock file " + lockPath + " is not a regular file");
     while (flock(impl->lockFd, LOCK_EX) != 0) {
         if (errno != EINTR) Fail(path, "cannot lock " + lockPath + ": " + ErrnoText(errno));
     }
 
     TknCtl::Lib::FileText text;
-    int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (fd >= 0 && openMode == OpenMode::kReplace) {
-        struct stat info {};
-        if (fstat(fd, &info) == 0 && S_ISREG(info.st_mode)) {
+    if (openMode == OpenMode::kReplace) {
+        // The document is not read: only the mode of the file it replaces is kept.
+        if (lstat(target.c_str(), &info) == 0) {
+            if (!S_ISREG(info.st_mode)) Fail(path, NotRegular(info.st_mode));
             impl->existed = true;
             impl->mode = info.st_mode & 0777;
+        } else if (errno != ENOENT) {
+            Fail(path, "cannot read: " + ErrnoText(errno));
         }
-        close(fd);
-        fd = -1;
-        errno = ENOENT;
-    }
-    if (fd < 0) {
-        if (errno != ENOENT) Fail(path, "cannot read: " + ErrnoText(errno));
         impl->mustWrite = true;
     } else {
-        struct stat info {};
-        if (fstat(fd, &info) != 0) {
-            int error = errno;
+        // Not blocking and not through a link: what was checked above may have been
+        // replaced since by something else.
+        int fd = open(target.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_CLOEXEC);
+        if (fd < 0) {
+            if (errno != ENOENT) Fail(path, "cannot read: " + ErrnoText(errno));
+            impl->mustWrite = true;
+        } else {
+            if (fstat(fd, &info) != 0) {
+                int error = errno;
+                close(fd);
+                Fail(path, "cannot read: " + ErrnoText(error));
+            }
+            if (!S_ISREG(info.st_mode)) {
+                close(fd);
+                Fail(path, NotRegular(info.st_mode));
+            }
+            impl->existed = true;
+            impl->mode = info.st_mode & 0777;
+            std::string fault = ReadFile(fd, static_cast<std::size_t>(info.st_size), text);
             close(fd);
-            Fail(path, "cannot read: " + ErrnoText(error));
+            if (!fault.empty()) Fail(path, fault);
         }
-        if (!S_ISREG(info.st_mode)) {
-            close(fd);
-            Fail(path, "not a regular file");
-        }
-        impl->existed = true;
-        impl->mode = info.st_mode & 0777;
-        std::string fault = ReadFile(fd, static_cast<std::size_t>(info.st_size), text);
-        close(fd);
-        if (!fault.empty()) Fail(path, fault);
     }
 
     if (impl->mustWrite) {
@@ -305,8 +361,8 @@ std::unique_ptr<HostSession> HostSession::OpenFile(const std::string& path, Open
 }
 
 void HostSession::Impl::WriteFile(const std::vector<std::string_view>& pieces) {
-    std::string dir = DirectoryOf(path);
-    std::string base = BaseOf(path);
+    std::string dir = DirectoryOf(target);
+    std::string base = BaseOf(target);
     std::string prefix = "." + base + ".tmp.";
 
     // Temporary files left by writers that were killed: we hold the lock, so no other
@@ -352,7 +408,7 @@ void HostSession::Impl::WriteFile(const std::vector<std::string_view>& pieces) {
         unlink(temp.c_str());
         Fail(path, "cannot write: close failed: " + ErrnoText(error));
     }
-    if (rename(temp.c_str(), path.c_str()) != 0) {
+    if (rename(temp.c_str(), target.c_str()) != 0) {
         int error = errno;
         unlink(temp.c_str());
         Fail(path, "cannot write: rename failed: " + ErrnoText(error));

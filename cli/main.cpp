@@ -18,6 +18,7 @@
 #include <vector>
 
 #include "hostctl/session.h"
+#include "zorbel/checked_output.h"
 #include "zorbel/dispatcher.h"
 #include "zorbel/formatter.h"
 
@@ -25,6 +26,28 @@ namespace {
 
 using Zorbel::AutoCli::Dispatcher;
 using Zorbel::AutoCli::GlobalOptions;
+
+// Standard output: std::cout writes through it. Never destroyed, so that std::cout can
+// still be flushed at exit.
+Zorbel::Output::CheckedOutput& g_stdout = *new Zorbel::Output::CheckedOutput(STDOUT_FILENO);
+bool g_writeErrorReported = false;
+
+// True when standard output could not be written; says so on stderr the first time, as the
+// core utilities do. Whatever was committed before stays committed.
+bool WriteFailed() {
+    if (g_stdout.Error() == 0) return false;
+    if (!g_writeErrorReported) {
+        std::cerr << "Error: write error: " << std::strerror(g_stdout.Error()) << '\n';
+        g_writeErrorReported = true;
+    }
+    return true;
+}
+
+// The exit status once every output is written: an unexpected failure (3) when it could not be.
+int Finished(int status) {
+    g_stdout.Finish();
+    return WriteFailed() ? Zorbel::AutoCli::EXIT_UNEXPECTED : status;
+}
 
 // A command on a large host allocates tens of megabytes in small blocks (the state file, its
 // parsed sections, one record per row, the rendered table). Faulting that memory in one 4 KiB
@@ -154,8 +177,7 @@ int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invo
     // The process ends with this command: the host state it read and the result it built are
     // left to the system to reclaim at once rather than taken apart value by value. (The
     // sanitizer build takes them apart, so that its leak check sees everything.)
-    std::cout.flush();
-    std::_Exit(status);
+    std::_Exit(Finished(status));
 #else
     return status;
 #endif
@@ -319,6 +341,8 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             std::cout << out.str();
             std::cerr << err.str();
             if (interactive) std::cout.flush();
+            // Output that cannot be delivered is lost for every later line too.
+            if (WriteFailed()) return Zorbel::AutoCli::EXIT_UNEXPECTED;
         }
     }
     if (input->bad()) {
@@ -395,15 +419,15 @@ int Main(int argc, char** argv) {
 
 int main(int argc, char** argv) {
     PrepareHeap();
+    Zorbel::Output::ReserveStandardDescriptors();
     std::ios::sync_with_stdio(false);
+    std::cout.rdbuf(&g_stdout);
     try {
-        int status = Main(argc, argv);
-        std::cout.flush();
-        return status;
+        return Finished(Main(argc, argv));
     } catch (const std::exception& e) {
         std::cerr << "Error: unexpected failure: " << Zorbel::Format::TerminalSafeLines(e.what()) << '\n';
     } catch (...) {
         std::cerr << "Error: unexpected failure\n";
     }
-    return Zorbel::AutoCli::EXIT_UNEXPECTED;
+    return Finished(Zorbel::AutoCli::EXIT_UNEXPECTED);
 }

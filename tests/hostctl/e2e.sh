@@ -34,6 +34,14 @@ exits_with() {
     local got=$?
     [ "$got" = "$want" ] || { echo "  '$*' exited $got, not $want: $(head -c 300 "$work/err")"; return 1; }
 }
+# full_exits_with STATUS COMMAND...: the same with standard output on a full disk.
+full_exits_with() {
+    local want=$1
+    shift
+    "$@" >/dev/full 2>"$work/err"
+    local got=$?
+    [ "$got" = "$want" ] || { echo "  '$*' >/dev/full exited $got, not $want: $(head -c 300 "$work/err")"; return 1; }
+}
 one_line_naming() { [ "$(wc -l <"$work/err")" = 1 ] && grep -qF -- "$1" "$work/err"; }
 
 # ---- reset, export, import ----
@@ -226,6 +234,32 @@ t "... creating nothing" [ ! -e "$P/nowhere.json" ] && [ ! -e "$P/nowhere.json.l
 ln -s loop.json "$P/loop.json"
 t "a loop of links is refused" exits_with 3 cli --state="$P/loop.json" simtest touch --mode read
 t "... in one line" one_line_naming "too many levels of symbolic links"
+
+# ---- output that cannot be written is a failure; what was committed stays ----
+if [ -c /dev/full ]; then
+    W=$work/write/host.json
+    "$SIM" --state="$W" reset
+    full="No space left on device"  # the programs do not set a locale: messages are in English
+    t "hadrocli fails when its output cannot be written" full_exits_with 3 cli --formatter=json --state="$W" simtest touch --mode ok
+    t "... in one line" one_line_naming "Error: write error: $full"
+    t "... and its change stays committed" grep -q '"ipsettings":{"ipv6Enabled":false}' "$W"
+    t "... so do help and listings" full_exits_with 3 cli --help
+    t "... and a batch" full_exits_with 3 sh -c "printf 'simtest touch --mode ok\nsimtest touch --mode ok\n' |
+        '$CLI' --plugin-dir='$PLUGINS' --state='$W' --formatter=json --batch -"
+    t "... which stops at the first output lost, after committing that line" \
+        grep -q '"ipsettings":{"ipv6Enabled":true}' "$W"
+    t "... and an atomic batch, after committing" full_exits_with 3 sh -c "echo 'simtest touch --mode ok' |
+        '$CLI' --plugin-dir='$PLUGINS' --state='$W' --formatter=json --batch - --atomic"
+    t "... the whole batch" grep -q '"ipsettings":{"ipv6Enabled":false}' "$W"
+    t "hadrosim export fails when its output cannot be written" full_exits_with 3 "$SIM" --state="$W" export
+    t "... in one line" one_line_naming "hadrosim: write error: $full"
+    t "... so does its help" full_exits_with 3 "$SIM" --help
+fi
+W=$work/closed/host.json
+t "hadrocli with standard output closed fails" exits_with 3 sh -c "'$CLI' --plugin-dir='$PLUGINS' --state='$W' \
+    --formatter=json simtest touch --mode read >&-"
+t "... in one line" one_line_naming "Error: write error: Bad file descriptor"
+t "... and writes nothing into the lock file" [ ! -s "$W.lock" ]
 
 # ---- several writers at once lose nothing (the lock) ----
 L=$work/lock/host.json

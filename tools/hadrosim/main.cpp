@@ -22,6 +22,7 @@
 #include "hostctl/session.h"
 #include "model/faults.h"
 #include "model/journal.h"
+#include "zorbel/checked_output.h"
 
 namespace {
 
@@ -62,7 +63,7 @@ const char* const kUsageText =
     "  --help, -h                     this text\n"
     "\n"
     "Exit status: 0 done, 2 the command line was refused, 3 the state file or the imported\n"
-    "document cannot be used.\n";
+    "document cannot be used, or the output cannot be written (a change is made all the same).\n";
 
 // A refused command line.
 struct UsageError {
@@ -301,14 +302,10 @@ int Run(const std::vector<std::string>& args) {
     }
     session->Commit();
     std::cout << output;
-    std::cout.flush();
     return kOk;
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-    std::ios::sync_with_stdio(false);
+int Main(int argc, char** argv) {
     try {
         return Run(std::vector<std::string>(argv + 1, argv + argc));
     } catch (const UsageError& e) {
@@ -323,4 +320,22 @@ int main(int argc, char** argv) {
         std::cerr << "hadrosim: unexpected failure\n";
     }
     return kFailed;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    Zorbel::Output::ReserveStandardDescriptors();
+    std::ios::sync_with_stdio(false);
+    // Never destroyed, so that std::cout can still be flushed at exit.
+    auto& out = *new Zorbel::Output::CheckedOutput(STDOUT_FILENO);
+    std::cout.rdbuf(&out);
+    const int status = Main(argc, argv);
+    // Output that could not be written (a full disk, a closed pipe) is a failure, as in the
+    // core utilities; a change already committed stays.
+    if (const int error = out.Finish(); error != 0) {
+        std::cerr << "hadrosim: write error: " << std::strerror(error) << '\n';
+        return kFailed;
+    }
+    return status;
 }

@@ -168,7 +168,8 @@ std::string ManPage(const std::string& program, NamespaceNode& root) {
         ".TP\n.B 0\nsuccess\n"
         ".TP\n.B 1\nthe command reported an error, or its result is false\n"
         ".TP\n.B 2\nthe command line was refused; nothing ran\n"
-        ".TP\n.B 3\nan unexpected failure (an unreadable or unwritable state file, an unhandled error)\n";
+        ".TP\n.B 3\nan unexpected failure (an unreadable or unwritable state file, output that cannot be "
+        "written, an unhandled error); a change already committed stays committed\n";
     out +=
         ".SH ENVIRONMENT\n"
         ".TP\n.B HADRO_BACKEND\nthe host to manage (\\fBsimulated\\fR or \\fBlinux\\fR) when "

@@ -19,7 +19,7 @@ OutputSpecPtr EnsMaxlcoresGet::GetOutputSpecInternal() {
 
 void EnsMaxlcoresGet::ExecuteInternal(InputPtr, OutputPtr output) {
     Frame::HostCall(output, [&] {
-        output->SetRootObject(Zorbel::MetaObj::MetaInt::New(static_cast<long>(NetworkInfo::GetMaxLcores())));
+        output->SetRootObject(Zorbel::MetaObj::MetaInt::NewUnsigned(NetworkInfo::GetMaxLcores()));
     });
 }
 

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <cstdint>
+
 #include "zorbel/autocli.h"
 #include "zorbel/formatter.h"
 #include "zorbel/metaobj.h"
@@ -118,4 +120,48 @@ TEST(Formatters, GenericTableColumnsLeaveNestedRecordsWhole) {
     out.clear();
     Zorbel::Format::Render("table", *root, parameters, out);
     EXPECT_EQ(out, "Name  Items\n----  ---------------\na     Id: 7, Up: true\n");
+}
+
+TEST(Formatters, UnsignedIntegersPrintAsTheValuesTheyAre) {
+    // Counters are unsigned 64-bit; signed values keep their sign.
+    auto record = MetaStruct::New("Nic");
+    record->SetField("Max", UINT64_MAX);
+    record->SetField("Half", std::uint64_t{1} << 63);
+    record->SetField("Min", INT64_MIN);
+    auto list = MetaList::New(META_STRUCT, record);
+    list->Add(record);
+    const std::string max = "18446744073709551615", half = "9223372036854775808",
+                      min = "-9223372036854775808";
+    const std::pair<const char*, std::string> expected[] = {
+        {"json", "[{\"Max\":" + max + ",\"Half\":" + half + ",\"Min\":" + min + "}]\n"},
+        {"simple", "Max: " + max + "\nHalf: " + half + "\nMin: " + min + "\n"},
+        {"table",
+         "Max                   Half                 Min\n"
+         "--------------------  -------------------  --------------------\n" +
+             max + "  " + half + "  " + min + "\n"},
+        {"csv", "Max,Half,Min\r\n" + max + "," + half + "," + min + "\r\n"},
+        {"keyvalue", "Nic.Max=" + max + "\nNic.Half=" + half + "\nNic.Min=" + min + "\n"},
+    };
+    for (const auto& [formatter, text] : expected) {
+        std::string out;
+        Zorbel::Format::Render(formatter, *list, {}, out);
+        EXPECT_EQ(out, text) << formatter;
+    }
+    std::string xml;
+    Zorbel::Format::Render("xml", *list, {}, xml);
+    EXPECT_NE(xml.find("<field name=\"Max\"><integer>" + max + "</integer></field>"), std::string::npos)
+        << xml;
+
+    // A root value; a copy stays unsigned; a signed reader gets the largest value it can hold.
+    auto root = MetaInt::NewUnsigned(UINT64_MAX);
+    std::string out;
+    Zorbel::Format::Render("simple", *root, {}, out);
+    EXPECT_EQ(out, max + "\n");
+    auto copy = std::static_pointer_cast<MetaInt>(root->Clone());
+    EXPECT_TRUE(copy->IsUnsigned());
+    EXPECT_EQ(copy->GetUnsigned(), UINT64_MAX);
+    EXPECT_EQ(copy->Get(), INT64_MAX);
+    copy->Set(-1);
+    EXPECT_FALSE(copy->IsUnsigned());
+    EXPECT_EQ(copy->Get(), -1);
 }

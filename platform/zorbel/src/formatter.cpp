@@ -105,6 +105,22 @@ std::size_t Utf8SequenceLength(const unsigned char* p, std::size_t remaining) {
     return length;
 }
 
+// The decimal text of an integer, signed or unsigned, appended to out.
+void AppendInteger(std::string& out, const MetaObject* value) {
+    const auto* integer = static_cast<const MetaInt*>(value);
+    char digits[24];
+    const auto end = integer->IsUnsigned()
+                         ? std::to_chars(digits, digits + sizeof(digits), integer->GetUnsigned())
+                         : std::to_chars(digits, digits + sizeof(digits), integer->Get());
+    out.append(digits, end.ptr);
+}
+
+std::string IntegerText(const MetaObject* value) {
+    std::string text;
+    AppendInteger(text, value);
+    return text;
+}
+
 // ---------------------------------------------------------------- JSON
 
 void AppendJson(std::string& out, const MetaObject* value) {
@@ -117,7 +133,7 @@ void AppendJson(std::string& out, const MetaObject* value) {
             AppendJsonString(out, static_cast<const MetaString*>(value)->Get());
             break;
         case MetaObj::META_INT:
-            out += std::to_string(static_cast<const MetaInt*>(value)->Get());
+            AppendInteger(out, value);
             break;
         case MetaObj::META_BOOL:
             out += static_cast<const MetaBool*>(value)->Get() ? "true" : "false";
@@ -266,10 +282,7 @@ public:
                 out += Display(text);
             }
         } else if (value->GetType() == MetaObj::META_INT) {
-            char digits[24];
-            const auto end =
-                std::to_chars(digits, digits + sizeof(digits), static_cast<const MetaInt*>(value)->Get());
-            out.append(digits, end.ptr);
+            AppendInteger(out, value);
             plain = true;
         } else {
             out += Plain(value);
@@ -290,7 +303,7 @@ public:
                 return raw_ ? static_cast<const MetaString*>(value)->Get()
                             : Display(static_cast<const MetaString*>(value)->Get());
             case MetaObj::META_INT:
-                return std::to_string(static_cast<const MetaInt*>(value)->Get());
+                return IntegerText(value);
             case MetaObj::META_BOOL:
                 return static_cast<const MetaBool*>(value)->Get() ? "true" : "false";
             case MetaObj::META_LIST: {
@@ -822,8 +835,9 @@ private:
                 out_ += "</string>";
                 break;
             case MetaObj::META_INT:
-                out_ +=
-                    "<integer>" + std::to_string(static_cast<const MetaInt*>(value)->Get()) + "</integer>";
+                out_ += "<integer>";
+                AppendInteger(out_, value);
+                out_ += "</integer>";
                 break;
             case MetaObj::META_BOOL:
                 out_ += static_cast<const MetaBool*>(value)->Get() ? "<boolean>true</boolean>"
@@ -1110,7 +1124,7 @@ private:
                 AppendKeyValueText(out_, static_cast<const MetaString*>(value)->Get());
                 break;
             case MetaObj::META_INT:
-                out_ += std::to_string(static_cast<const MetaInt*>(value)->Get());
+                AppendInteger(out_, value);
                 break;
             case MetaObj::META_BOOL:
                 out_ += static_cast<const MetaBool*>(value)->Get() ? "true" : "false";

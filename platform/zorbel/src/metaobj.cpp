@@ -23,8 +23,13 @@ std::shared_ptr<MetaInt> MetaInt::New() {
 std::shared_ptr<MetaInt> MetaInt::New(long value) {
     return std::make_shared<MetaInt>(value);
 }
+std::shared_ptr<MetaInt> MetaInt::NewUnsigned(std::uint64_t value) {
+    auto made = std::make_shared<MetaInt>();
+    made->SetUnsigned(value);
+    return made;
+}
 std::shared_ptr<MetaObject> MetaInt::Clone() const {
-    return std::make_shared<MetaInt>(value_);
+    return std::make_shared<MetaInt>(*this);
 }
 
 std::shared_ptr<MetaBool> MetaBool::New() {
@@ -117,6 +122,9 @@ void MetaStruct::SetField(const std::string& field, const std::vector<std::strin
 }
 void MetaStruct::SetIntField(const std::string& field, std::int64_t value) {
     SetField(field, std::shared_ptr<MetaObject>(std::make_shared<MetaInt>(value)));
+}
+void MetaStruct::SetUnsignedField(const std::string& field, std::uint64_t value) {
+    SetField(field, std::shared_ptr<MetaObject>(MetaInt::NewUnsigned(value)));
 }
 
 bool MetaStruct::HasField(const std::string& field) const {

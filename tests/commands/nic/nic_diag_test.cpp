@@ -84,9 +84,20 @@ TEST_F(NicDiagTest, StatsGet) {
     EXPECT_EQ(simple.out.substr(0, simple.out.find('\n', simple.out.find('\n') + 1)),
               "NIC statistics for vmnic5\n   Packets received: 921101555");
 
-    EditNic("vmnic6", [](json& nic) { nic["stats"]["txWindowErrors"] = 18446744073709551615ull; });
-    EXPECT_EQ(Json("network nic stats get -n vmnic6")[0]["Transmit window errors"],
-              -1);  // shown as a 64-bit integer
+    // Counters are unsigned 64-bit: 2^63 and more are shown as they are, in every formatter.
+    EditNic("vmnic6", [](json& nic) {
+        nic["stats"]["txWindowErrors"] = 18446744073709551615ull;
+        nic["stats"]["rxPackets"] = 9223372036854775808ull;
+    });
+    EXPECT_EQ(Json("network nic stats get -n vmnic6")[0]["Transmit window errors"], 18446744073709551615ull);
+    for (const char* formatter : {"simple", "table", "json", "xml", "csv", "keyvalue"}) {
+        const auto out =
+            Run(std::string("--formatter=") + formatter + " network nic stats get -n vmnic6").out;
+        EXPECT_NE(out.find("18446744073709551615"), std::string::npos) << formatter << ":\n" << out;
+        EXPECT_NE(out.find("9223372036854775808"), std::string::npos) << formatter << ":\n" << out;
+        EXPECT_EQ(out.find("-1"), std::string::npos) << formatter << ":\n" << out;
+        EXPECT_EQ(out.find("-9"), std::string::npos) << formatter << ":\n" << out;
+    }
     EXPECT_EQ(Error("network nic stats get -n vmnic9"),
               "Unable to get stats for NIC: Physical NIC vmnic9 does not exist");
     AddFault("TknCtl::Network::PnicImpl::GetPnicStats", "vmnic0", "counters frozen");

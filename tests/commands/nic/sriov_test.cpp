@@ -73,6 +73,17 @@ TEST_F(SriovTest, VfStats) {
     EXPECT_EQ(list[0]["Tx TSO Bytes"], 913220118);
     EXPECT_EQ(list[0].size(), 22u);
     EXPECT_EQ(Json("network sriovnic vf stats -n vmnic5 --vf-id +3")[0]["VF ID"], 3);
+    // Counters of 2^63 and more are shown as they are.
+    EditHost([](json& doc) {
+        for (auto& nic : doc["pnics"]) {
+            if (nic["name"] == "vmnic5")
+                nic["sriov"]["vfs"][0]["stats"]["txTsoBytes"] = 9223372036854775809ull;
+        }
+    });
+    EXPECT_EQ(Json("network sriovnic vf stats -n vmnic5 -v 0")[0]["Tx TSO Bytes"], 9223372036854775809ull);
+    EXPECT_NE(
+        Run("network sriovnic vf stats -n vmnic5 -v 0").out.find("\nTx TSO Bytes: 9223372036854775809\n"),
+        std::string::npos);
 
     EXPECT_EQ(Error("network sriovnic vf stats -n vmnic5 -v 4"),
               "Unable to get VF Stats. Error:vmnic5 has no VF 4");

@@ -43,20 +43,38 @@ private:
     std::string value_;
 };
 
+// A signed or an unsigned 64-bit integer (counters reach 2^63 and more). Formatters print
+// either as the value it is.
 class MetaInt : public MetaObject {
 public:
     static std::shared_ptr<MetaInt> New();
     static std::shared_ptr<MetaInt> New(long value);
+    static std::shared_ptr<MetaInt> NewUnsigned(std::uint64_t value);
     MetaInt() = default;
-    explicit MetaInt(std::int64_t value) : value_(value) {}
+    explicit MetaInt(std::int64_t value) : bits_(static_cast<std::uint64_t>(value)) {}
 
     MetaType GetType() const override { return META_INT; }
     std::shared_ptr<MetaObject> Clone() const override;
-    std::int64_t Get() const { return value_; }
-    void Set(std::int64_t value) { value_ = value; }
+    // The value as a signed integer; an unsigned value above INT64_MAX gives INT64_MAX.
+    std::int64_t Get() const {
+        if (unsigned_ && bits_ > static_cast<std::uint64_t>(INT64_MAX)) return INT64_MAX;
+        return static_cast<std::int64_t>(bits_);
+    }
+    void Set(std::int64_t value) {
+        bits_ = static_cast<std::uint64_t>(value);
+        unsigned_ = false;
+    }
+    // Whether the value was set as an unsigned one, and that value.
+    bool IsUnsigned() const { return unsigned_; }
+    std::uint64_t GetUnsigned() const { return bits_; }
+    void SetUnsigned(std::uint64_t value) {
+        bits_ = value;
+        unsigned_ = true;
+    }
 
 private:
-    std::int64_t value_ = 0;
+    std::uint64_t bits_ = 0;  // the value, or its two's complement when signed and negative
+    bool unsigned_ = false;
 };
 
 class MetaBool : public MetaObject {
@@ -102,12 +120,17 @@ public:
     void SetField(const std::string& field, int value);
     void SetField(const std::string& field, long value);
     void SetField(const std::string& field, const std::vector<std::string>& values);
-    // Other integer widths, so that unsigned and 64-bit counters need no cast.
+    // Other integer widths, so that unsigned and 64-bit counters need no cast: unsigned types
+    // keep their values up to 2^64 - 1.
     template <typename T>
     requires(std::is_integral_v<T> && !std::is_same_v<T, bool> && !std::is_same_v<T, int> &&
              !std::is_same_v<T, long> &&
              !std::is_same_v<T, char>) void SetField(const std::string& field, T value) {
-        SetIntField(field, static_cast<std::int64_t>(value));
+        if constexpr (std::is_unsigned_v<T>) {
+            SetUnsignedField(field, static_cast<std::uint64_t>(value));
+        } else {
+            SetIntField(field, static_cast<std::int64_t>(value));
+        }
     }
 
     const std::vector<Field>& GetFields() const { return fields_; }
@@ -119,6 +142,7 @@ public:
 
 private:
     void SetIntField(const std::string& field, std::int64_t value);
+    void SetUnsignedField(const std::string& field, std::uint64_t value);
 
     std::string name_;
     std::vector<Field> fields_;

@@ -169,6 +169,18 @@ TEST(Document, ScanFindsSectionEndsWhereverTheTextFalls) {
     }
 }
 
+TEST(Document, ScanFollowsDeepNesting) {
+    std::string open, close;
+    for (int level = 0; level < 100; ++level) {
+        open += "[{\"a\":";
+        close += "}]";
+    }
+    EXPECT_EQ(Refusal("{\"version\":1,\"pnics\":" + open + "1" + close + "}"), "");
+    const std::string crossed = std::string(200, '[') + std::string(199, ']') + "}";
+    EXPECT_NE(Refusal("{\"version\":1,\"pnics\":" + crossed + "}").find("mismatched '}' at byte 420"),
+              std::string::npos);
+}
+
 TEST(Document, SectionsAreParsedWhenTouchedAndCheckedStrictly) {
     // A broken section does not stop a session that never touches it...
     auto session =

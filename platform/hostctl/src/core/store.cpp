@@ -104,6 +104,10 @@ std::uint64_t PrefixXor(std::uint64_t mask) {
     return mask;
 }
 
+[[gnu::noinline, gnu::cold]] std::string Mismatched(char c, std::size_t at) {
+    return "mismatched '" + std::string(1, c) + "' at byte " + std::to_string(at);
+}
+
 // A forward-only reader of the document's top level. It knows enough JSON to find where
 // each value ends (strings with escapes, nested brackets) without building anything.
 class Scanner {
@@ -145,26 +149,29 @@ public:
     // no backslash, the quotes tell at once which bytes lie inside strings and only the
     // brackets outside them are visited; else every byte that matters is, in order.
     std::string SkipContainer() {
-        std::vector<char> closers;
+        // The closing brackets still due, innermost last (most documents nest a few levels).
+        std::vector<char> closers(32);
+        std::size_t depth = 0;
         const char* data = text_.data();
         const std::size_t size = text_.size();
         bool inString = false;
         bool escaped = false;  // a backslash ended the last block: the next byte is escaped
         char tail[64];
-        // A bracket outside strings; true when it closed the container (pos is then past it),
-        // or when it does not match (fault set).
-        auto bracket = [&](char c, std::size_t at, std::string& fault) {
+        // A bracket outside strings (there is one every few bytes: kept inline and small);
+        // true when it closed the container (pos is then past it), or when it does not match
+        // (fault set).
+        auto bracket = [&](char c, std::size_t at, std::string& fault) __attribute__((always_inline)) {
             if (c == '{' || c == '[') {
-                closers.push_back(c == '{' ? '}' : ']');
+                if (depth == closers.size()) closers.resize(2 * depth);
+                closers[depth++] = c == '{' ? '}' : ']';
                 return false;
             }
             pos = at + 1;
-            if (closers.empty() || closers.back() != c) {
-                fault = "mismatched '" + std::string(1, c) + "' at byte " + std::to_string(at);
+            if (depth == 0 || closers[depth - 1] != c) {
+                fault = Mismatched(c, at);
                 return true;
             }
-            closers.pop_back();
-            return closers.empty();
+            return --depth == 0;
         };
         std::string fault;
         for (std::size_t base = pos; base < size; base += 64) {

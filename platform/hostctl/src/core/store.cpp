@@ -485,9 +485,9 @@ Store::Snapshot Store::TakeSnapshot() const {
     Snapshot snapshot;
     snapshot.serialized.resize(slots_.size());
     snapshot.digests.resize(slots_.size());
-    snapshot.names.reserve(slots_.size());
+    snapshot.names.reserve(slots_.size() + 1);  // never moved: pieces point into them
     snapshot.pieces.push_back(kHeader);
-    snapshot.digestsMember = ",\n\"digests\":{";
+    std::string digests = ",\n\"digests\":{";
     for (std::size_t i = 0; i < slots_.size(); ++i) {
         const auto& slot = slots_[i];
         std::string_view content;
@@ -505,15 +505,16 @@ Store::Snapshot Store::TakeSnapshot() const {
         snapshot.names.push_back(",\n\"" + std::string(slot.kind->Name()) + "\":");
         snapshot.pieces.push_back(snapshot.names.back());
         snapshot.pieces.push_back(content);
-        if (snapshot.digestsMember.back() != '{') snapshot.digestsMember += ',';
-        snapshot.digestsMember += '"';
-        snapshot.digestsMember += slot.kind->Name();
-        snapshot.digestsMember += "\":\"";
-        snapshot.digestsMember += DigestText(*snapshot.digests[i]);
-        snapshot.digestsMember += '"';
+        if (digests.back() != '{') digests += ',';
+        digests += '"';
+        digests += slot.kind->Name();
+        digests += "\":\"";
+        digests += DigestText(*snapshot.digests[i]);
+        digests += '"';
     }
-    snapshot.digestsMember += '}';
-    snapshot.pieces.push_back(snapshot.digestsMember);
+    digests += '}';
+    snapshot.names.push_back(std::move(digests));
+    snapshot.pieces.push_back(snapshot.names.back());
     snapshot.pieces.push_back(kTrailer);
     return snapshot;
 }

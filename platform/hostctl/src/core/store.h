@@ -68,8 +68,7 @@ public:
     struct Snapshot {
         std::vector<std::optional<std::string>> serialized;  // per section, when re-serialised
         std::vector<std::optional<std::uint64_t>> digests;   // per section, when written
-        std::vector<std::string> names;                      // the text before each section
-        std::string digestsMember;                           // the "digests" member
+        std::vector<std::string> names;                      // the text before each section, then "digests"
         std::vector<std::string_view> pieces;
     };
     Snapshot TakeSnapshot() const;

@@ -302,6 +302,11 @@ TEST(Document, DigestsTellTheLibrarysSectionsFromEditedOnes) {
     for (int i = 0; i < 1000; ++i)
         pattern += static_cast<char>(i * 7 + i / 13);
     EXPECT_EQ(TknCtl::Lib::DigestText(TknCtl::Lib::Digest(pattern)), "926113c454f0ea58");
+    // Taken piece by piece (as the scan does), the same.
+    TknCtl::Lib::Digester pieces;
+    pieces.AddBlocks(std::string_view(pattern).substr(0, 640));
+    pieces.AddBlocks(std::string_view(pattern).substr(640, 64));
+    EXPECT_EQ(pieces.Finish(std::string_view(pattern).substr(704)), TknCtl::Lib::Digest(pattern));
     EXPECT_EQ(TknCtl::Lib::ParseDigest(TknCtl::Lib::DigestText(digest)), digest);
 }
 

@@ -30,7 +30,7 @@ constexpr std::uint64_t kKeys[8] = {
     0x243F6A8885A308D3ULL, 0x13198A2E03707344ULL, 0xA4093822299F31D0ULL, 0x082EFA98EC4E6C89ULL,
     0x452821E638D01377ULL, 0xBE5466CF34E90C6CULL, 0xC0AC29B7C97C50DDULL, 0x3F84D5B5B5470917ULL,
 };
-constexpr std::size_t kBlock = 64;
+constexpr std::size_t kBlock = Digester::kBlock;
 
 std::uint64_t Rotl(std::uint64_t x, int r) {
     return (x << r) | (x >> (64 - r));
@@ -55,7 +55,7 @@ struct Lanes {
 };
 
 // Blocks [p, p + 64 * count) added to the lanes.
-void AddBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
+void MixBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
 #if defined(__SSE2__)
     __m128i sum[4];
     __m128i key[4];
@@ -94,7 +94,7 @@ void AddBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
 #if defined(HADRO_DIGEST_AVX2)
 // The same, four lanes at a time, where the processor has AVX2 (the shuffle swaps the words
 // within each half, as SSE2 does within its register).
-__attribute__((target("avx2"))) void AddBlocksAvx2(Lanes& lanes, const unsigned char* p, std::size_t count) {
+__attribute__((target("avx2"))) void MixBlocksAvx2(Lanes& lanes, const unsigned char* p, std::size_t count) {
     __m256i sum[2];
     __m256i key[2];
     for (int j = 0; j < 2; ++j) {
@@ -127,33 +127,48 @@ bool HasAvx2() {
 #endif
 
 // Whole blocks by the widest means at hand.
-void AddWholeBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
+void MixWholeBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
 #if defined(HADRO_DIGEST_AVX2)
     if (HasAvx2()) {
-        AddBlocksAvx2(lanes, p, count);
+        MixBlocksAvx2(lanes, p, count);
         return;
     }
 #endif
-    AddBlocks(lanes, p, count);
+    MixBlocks(lanes, p, count);
 }
 
 }  // namespace
 
-std::uint64_t Digest(std::string_view bytes) {
-    Lanes lanes;
+Digester::Digester() {
     for (int i = 0; i < 8; ++i) {
-        lanes.sum[i] = kKeys[7 - i];
-        lanes.key[i] = kKeys[i];
+        sum_[i] = kKeys[7 - i];
+        key_[i] = kKeys[i];
     }
-    const auto* data = reinterpret_cast<const unsigned char*>(bytes.data());
-    const std::size_t whole = bytes.size() / kBlock;
-    AddWholeBlocks(lanes, data, whole);
-    if (const std::size_t rest = bytes.size() % kBlock; rest != 0) {
+}
+
+void Digester::AddBlocks(std::string_view blocks) {
+    Lanes lanes;
+    std::memcpy(lanes.sum, sum_, sizeof sum_);
+    std::memcpy(lanes.key, key_, sizeof key_);
+    MixWholeBlocks(lanes, reinterpret_cast<const unsigned char*>(blocks.data()), blocks.size() / kBlock);
+    std::memcpy(sum_, lanes.sum, sizeof sum_);
+    std::memcpy(key_, lanes.key, sizeof key_);
+    length_ += blocks.size();
+}
+
+std::uint64_t Digester::Finish(std::string_view rest) const {
+    Lanes lanes;
+    std::memcpy(lanes.sum, sum_, sizeof sum_);
+    std::memcpy(lanes.key, key_, sizeof key_);
+    const auto* data = reinterpret_cast<const unsigned char*>(rest.data());
+    const std::size_t whole = rest.size() / kBlock;
+    MixWholeBlocks(lanes, data, whole);
+    if (const std::size_t left = rest.size() % kBlock; left != 0) {
         unsigned char last[kBlock] = {};
-        std::memcpy(last, data + whole * kBlock, rest);
-        AddBlocks(lanes, last, 1);
+        std::memcpy(last, data + whole * kBlock, left);
+        MixBlocks(lanes, last, 1);
     }
-    std::uint64_t h = kPrime5 + static_cast<std::uint64_t>(bytes.size()) * kPrime1;
+    std::uint64_t h = kPrime5 + (length_ + rest.size()) * kPrime1;
     for (std::uint64_t sum : lanes.sum) {
         h ^= Rotl(sum * kPrime2, 31) * kPrime1;
         h = Rotl(h, 27) * kPrime1 + kPrime4;
@@ -164,6 +179,10 @@ std::uint64_t Digest(std::string_view bytes) {
     h *= kPrime3;
     h ^= h >> 32;
     return h;
+}
+
+std::uint64_t Digest(std::string_view bytes) {
+    return Digester().Finish(bytes);
 }
 
 std::string DigestText(std::uint64_t digest) {

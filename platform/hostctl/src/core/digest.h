@@ -8,6 +8,7 @@
 // machine, whatever its byte order and whether or not vector instructions are used.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -16,6 +17,24 @@
 namespace TknCtl::Lib {
 
 std::uint64_t Digest(std::string_view bytes);
+
+// The same digest taken piece by piece, for a reader that goes through the bytes anyway:
+// while they are still in the processor's caches.
+class Digester {
+public:
+    static constexpr std::size_t kBlock = 64;
+
+    Digester();
+    // The next bytes; their number must be a multiple of kBlock.
+    void AddBlocks(std::string_view blocks);
+    // The digest of everything added and then rest (of any length).
+    std::uint64_t Finish(std::string_view rest) const;
+
+private:
+    std::uint64_t sum_[8];
+    std::uint64_t key_[8];
+    std::uint64_t length_ = 0;
+};
 
 // The digest as written in a document: 16 lowercase hexadecimal digits.
 std::string DigestText(std::uint64_t digest);

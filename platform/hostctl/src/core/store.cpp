@@ -115,6 +115,10 @@ public:
     explicit Scanner(std::string_view text) : text_(text) {}
 
     std::size_t pos = 0;
+    // When set, a container skipped is also added to the digester up to hashed, 4 KiB at a
+    // time while its bytes are still in the cache; the caller adds the rest.
+    Digester* digester = nullptr;
+    std::size_t hashed = 0;
 
     bool AtEnd() const { return pos >= text_.size(); }
     char Peek() const { return text_[pos]; }
@@ -175,6 +179,11 @@ public:
         };
         std::string fault;
         for (std::size_t base = pos; base < size; base += 64) {
+            // What lies before this block is inside the container.
+            if (digester && base - hashed >= kHashedAtOnce) {
+                digester->AddBlocks(text_.substr(hashed, base - hashed));
+                hashed = base;
+            }
             const std::size_t width = std::min<std::size_t>(64, size - base);
             const char* block = data + base;
             if (width < 64) {
@@ -237,6 +246,7 @@ public:
     }
 
 private:
+    static constexpr std::size_t kHashedAtOnce = 4096;  // a multiple of the blocks
     std::string_view text_;
 };
 
@@ -293,6 +303,11 @@ void Store::Scan() {
             ++scan.pos;
             scan.SkipBlanks();
             std::size_t valueStart = scan.pos;
+            // A section's digest is taken as it is skipped.
+            Digester digester;
+            const bool section = FindSection(key) != nullptr;
+            scan.digester = section ? &digester : nullptr;
+            scan.hashed = valueStart;
             std::string fault = scan.SkipValue();
             if (fault == "truncated") truncated();
             if (!fault.empty()) Refuse(current + ": " + fault);
@@ -319,6 +334,7 @@ void Store::Scan() {
                 slot->present = true;
                 slot->begin = valueStart;
                 slot->end = valueEnd;
+                slot->digest = digester.Finish(text_.substr(scan.hashed, valueEnd - scan.hashed));
             }
 
             scan.SkipBlanks();
@@ -390,13 +406,10 @@ void Store::ReadDigests(std::string_view member) {
     }
 }
 
-bool Store::Verify() {
-    for (auto& slot : slots_) {
+bool Store::Verify() const {
+    for (const auto& slot : slots_) {
         if (slot.present != slot.recorded.has_value()) return false;
-        if (!slot.present || slot.digest) continue;
-        const std::uint64_t digest = Digest(Raw(slot));
-        if (digest != *slot.recorded) return false;
-        slot.digest = digest;
+        if (slot.present && slot.digest != slot.recorded) return false;
     }
     return true;
 }
@@ -496,8 +509,7 @@ Store::Snapshot Store::TakeSnapshot() const {
             content = *snapshot.serialized[i];
             snapshot.digests[i] = Digest(content);
         } else if (slot.present) {
-            // Unchanged: the digest it was read with, unless it had none that held.
-            content = Raw(slot);
+            content = Raw(slot);  // unchanged: its digest is known since the scan
             snapshot.digests[i] = slot.digest ? *slot.digest : Digest(content);
         } else {
             continue;
@@ -562,10 +574,6 @@ void Store::Rebase(std::string text) {
         slot.digest.reset();
     }
     Scan();
-    // The text is this store's own export: its digests hold.
-    for (auto& slot : slots_) {
-        if (slot.present) slot.digest = slot.recorded;
-    }
 }
 
 }  // namespace TknCtl::Lib

@@ -56,7 +56,7 @@ public:
     // gives none for a section it does not have): the document is as the library wrote it.
     // Else something was edited outside the library, and since the checks of one section
     // look into others, the whole document must be checked (LoadAll) before it is used.
-    bool Verify();
+    bool Verify() const;
     // Marks every section changed so that the next export writes all of them in the
     // canonical form.
     void RewriteAll();
@@ -95,7 +95,7 @@ private:
         std::unique_ptr<SectionData> data;
         std::unique_ptr<std::string> committed;  // the section's text since the last commit
         std::optional<std::uint64_t> recorded;   // the digest the document gives for it
-        std::optional<std::uint64_t> digest;     // the digest of its text, when known
+        std::optional<std::uint64_t> digest;     // the digest of its text (when present)
     };
 
     Slot& SlotOf(const SectionKind& kind);

@@ -27,17 +27,17 @@ namespace {
 using Zorbel::AutoCli::Dispatcher;
 using Zorbel::AutoCli::GlobalOptions;
 
-// Standard output: std::cout writes through it. Never destroyed, so that std::cout can
-// still be flushed at exit.
-Zorbel::Output::CheckedOutput& g_stdout = *new Zorbel::Output::CheckedOutput(STDOUT_FILENO);
+// Standard output: std::cout writes through it. Made by main once the heap is prepared, and
+// never destroyed, so that std::cout can still be flushed at exit.
+Zorbel::Output::CheckedOutput* g_stdout = nullptr;
 bool g_writeErrorReported = false;
 
 // True when standard output could not be written; says so on stderr the first time, as the
 // core utilities do. Whatever was committed before stays committed.
 bool WriteFailed() {
-    if (g_stdout.Error() == 0) return false;
+    if (g_stdout->Error() == 0) return false;
     if (!g_writeErrorReported) {
-        std::cerr << "Error: write error: " << std::strerror(g_stdout.Error()) << '\n';
+        std::cerr << "Error: write error: " << std::strerror(g_stdout->Error()) << '\n';
         g_writeErrorReported = true;
     }
     return true;
@@ -45,7 +45,7 @@ bool WriteFailed() {
 
 // The exit status once every output is written: an unexpected failure (3) when it could not be.
 int Finished(int status) {
-    g_stdout.Finish();
+    g_stdout->Finish();
     return WriteFailed() ? Zorbel::AutoCli::EXIT_UNEXPECTED : status;
 }
 
@@ -421,7 +421,8 @@ int main(int argc, char** argv) {
     PrepareHeap();
     Zorbel::Output::ReserveStandardDescriptors();
     std::ios::sync_with_stdio(false);
-    std::cout.rdbuf(&g_stdout);
+    g_stdout = new Zorbel::Output::CheckedOutput(STDOUT_FILENO);
+    std::cout.rdbuf(g_stdout);
     try {
         return Finished(Main(argc, argv));
     } catch (const std::exception& e) {

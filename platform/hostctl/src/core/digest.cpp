@@ -5,10 +5,6 @@
 #if defined(__SSE2__)
 #include <emmintrin.h>
 #endif
-#if defined(__x86_64__) && (defined(__GNUC__) || defined(__clang__))
-#include <immintrin.h>
-#define HADRO_DIGEST_AVX2 1
-#endif
 
 namespace TknCtl::Lib {
 
@@ -49,19 +45,15 @@ std::uint64_t Rotl(std::uint64_t x, int r) {
     return value;
 }
 
-struct Lanes {
-    std::uint64_t sum[8];
-    std::uint64_t key[8];
-};
-
 // Blocks [p, p + 64 * count) added to the lanes.
-void MixBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
+void MixBlocks(std::uint64_t (&sums)[8], std::uint64_t (&keys)[8], const unsigned char* p,
+               std::size_t count) {
 #if defined(__SSE2__)
     __m128i sum[4];
     __m128i key[4];
     for (int j = 0; j < 4; ++j) {
-        sum[j] = _mm_loadu_si128(reinterpret_cast<const __m128i*>(lanes.sum + 2 * j));
-        key[j] = _mm_loadu_si128(reinterpret_cast<const __m128i*>(lanes.key + 2 * j));
+        sum[j] = _mm_loadu_si128(reinterpret_cast<const __m128i*>(sums + 2 * j));
+        key[j] = _mm_loadu_si128(reinterpret_cast<const __m128i*>(keys + 2 * j));
     }
     const __m128i step = _mm_set1_epi64x(static_cast<long long>(kStep));
     for (std::size_t block = 0; block < count; ++block, p += kBlock) {
@@ -74,8 +66,8 @@ void MixBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
         }
     }
     for (int j = 0; j < 4; ++j) {
-        _mm_storeu_si128(reinterpret_cast<__m128i*>(lanes.sum + 2 * j), sum[j]);
-        _mm_storeu_si128(reinterpret_cast<__m128i*>(lanes.key + 2 * j), key[j]);
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(sums + 2 * j), sum[j]);
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(keys + 2 * j), key[j]);
     }
 #else
     for (std::size_t block = 0; block < count; ++block, p += kBlock) {
@@ -83,58 +75,12 @@ void MixBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
         for (int i = 0; i < 8; ++i)
             words[i] = Word(p + 8 * i);
         for (int i = 0; i < 8; ++i) {
-            const std::uint64_t keyed = words[i] ^ lanes.key[i];
-            lanes.sum[i] += (keyed & 0xFFFFFFFFULL) * (keyed >> 32) + words[i ^ 1];
-            lanes.key[i] += kStep;
+            const std::uint64_t keyed = words[i] ^ keys[i];
+            sums[i] += (keyed & 0xFFFFFFFFULL) * (keyed >> 32) + words[i ^ 1];
+            keys[i] += kStep;
         }
     }
 #endif
-}
-
-#if defined(HADRO_DIGEST_AVX2)
-// The same, four lanes at a time, where the processor has AVX2 (the shuffle swaps the words
-// within each half, as SSE2 does within its register).
-__attribute__((target("avx2"))) void MixBlocksAvx2(Lanes& lanes, const unsigned char* p, std::size_t count) {
-    __m256i sum[2];
-    __m256i key[2];
-    for (int j = 0; j < 2; ++j) {
-        sum[j] = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(lanes.sum + 4 * j));
-        key[j] = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(lanes.key + 4 * j));
-    }
-    const __m256i step = _mm256_set1_epi64x(static_cast<long long>(kStep));
-    for (std::size_t block = 0; block < count; ++block, p += kBlock) {
-        for (int j = 0; j < 2; ++j) {
-            const __m256i words = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(p + 32 * j));
-            const __m256i keyed = _mm256_xor_si256(words, key[j]);
-            const __m256i product = _mm256_mul_epu32(keyed, _mm256_srli_epi64(keyed, 32));
-            sum[j] = _mm256_add_epi64(sum[j], _mm256_add_epi64(product, _mm256_shuffle_epi32(words, 0x4e)));
-            key[j] = _mm256_add_epi64(key[j], step);
-        }
-    }
-    for (int j = 0; j < 2; ++j) {
-        _mm256_storeu_si256(reinterpret_cast<__m256i*>(lanes.sum + 4 * j), sum[j]);
-        _mm256_storeu_si256(reinterpret_cast<__m256i*>(lanes.key + 4 * j), key[j]);
-    }
-}
-
-bool HasAvx2() {
-    static const bool has = [] {
-        __builtin_cpu_init();
-        return __builtin_cpu_supports("avx2") != 0;
-    }();
-    return has;
-}
-#endif
-
-// Whole blocks by the widest means at hand.
-void MixWholeBlocks(Lanes& lanes, const unsigned char* p, std::size_t count) {
-#if defined(HADRO_DIGEST_AVX2)
-    if (HasAvx2()) {
-        MixBlocksAvx2(lanes, p, count);
-        return;
-    }
-#endif
-    MixBlocks(lanes, p, count);
 }
 
 }  // namespace
@@ -147,29 +93,25 @@ Digester::Digester() {
 }
 
 void Digester::AddBlocks(std::string_view blocks) {
-    Lanes lanes;
-    std::memcpy(lanes.sum, sum_, sizeof sum_);
-    std::memcpy(lanes.key, key_, sizeof key_);
-    MixWholeBlocks(lanes, reinterpret_cast<const unsigned char*>(blocks.data()), blocks.size() / kBlock);
-    std::memcpy(sum_, lanes.sum, sizeof sum_);
-    std::memcpy(key_, lanes.key, sizeof key_);
+    MixBlocks(sum_, key_, reinterpret_cast<const unsigned char*>(blocks.data()), blocks.size() / kBlock);
     length_ += blocks.size();
 }
 
 std::uint64_t Digester::Finish(std::string_view rest) const {
-    Lanes lanes;
-    std::memcpy(lanes.sum, sum_, sizeof sum_);
-    std::memcpy(lanes.key, key_, sizeof key_);
+    std::uint64_t sums[8];
+    std::uint64_t keys[8];
+    std::memcpy(sums, sum_, sizeof sums);
+    std::memcpy(keys, key_, sizeof keys);
     const auto* data = reinterpret_cast<const unsigned char*>(rest.data());
     const std::size_t whole = rest.size() / kBlock;
-    MixWholeBlocks(lanes, data, whole);
+    MixBlocks(sums, keys, data, whole);
     if (const std::size_t left = rest.size() % kBlock; left != 0) {
         unsigned char last[kBlock] = {};
         std::memcpy(last, data + whole * kBlock, left);
-        MixBlocks(lanes, last, 1);
+        MixBlocks(sums, keys, last, 1);
     }
     std::uint64_t h = kPrime5 + (length_ + rest.size()) * kPrime1;
-    for (std::uint64_t sum : lanes.sum) {
+    for (std::uint64_t sum : sums) {
         h ^= Rotl(sum * kPrime2, 31) * kPrime1;
         h = Rotl(h, 27) * kPrime1 + kPrime4;
     }

@@ -430,6 +430,7 @@ void HostSession::Commit() {
     // then for writing.
     Store::Snapshot snapshot = impl_->store->TakeSnapshot();
     if (!impl_->mustWrite && !impl_->store->Differs(snapshot)) return;
+    impl_->store->AddDigests(snapshot);
     if (!impl_->path.empty()) impl_->WriteFile(snapshot.pieces);
     impl_->mustWrite = false;
     impl_->store->Committed(std::move(snapshot));

@@ -497,43 +497,56 @@ bool Store::Differs(const Snapshot& snapshot) const {
 Store::Snapshot Store::TakeSnapshot() const {
     Snapshot snapshot;
     snapshot.serialized.resize(slots_.size());
-    snapshot.digests.resize(slots_.size());
     snapshot.names.reserve(slots_.size() + 1);  // never moved: pieces point into them
     snapshot.pieces.push_back(kHeader);
-    std::string digests = ",\n\"digests\":{";
     for (std::size_t i = 0; i < slots_.size(); ++i) {
         const auto& slot = slots_[i];
         std::string_view content;
         if (slot.data && slot.dirty) {
             snapshot.serialized[i] = slot.kind->Serialize(*slot.data);
             content = *snapshot.serialized[i];
-            snapshot.digests[i] = Digest(content);
         } else if (slot.present) {
-            content = Raw(slot);  // unchanged: its digest is known since the scan
-            snapshot.digests[i] = slot.digest ? *slot.digest : Digest(content);
+            content = Raw(slot);
         } else {
             continue;
         }
         snapshot.names.push_back(",\n\"" + std::string(slot.kind->Name()) + "\":");
         snapshot.pieces.push_back(snapshot.names.back());
         snapshot.pieces.push_back(content);
-        if (digests.back() != '{') digests += ',';
-        digests += '"';
-        digests += slot.kind->Name();
-        digests += "\":\"";
-        digests += DigestText(*snapshot.digests[i]);
-        digests += '"';
     }
-    digests += '}';
-    snapshot.names.push_back(std::move(digests));
+    return snapshot;
+}
+
+void Store::AddDigests(Snapshot& snapshot) const {
+    snapshot.digests.assign(slots_.size(), std::nullopt);
+    std::string member = ",\n\"digests\":{";
+    member.reserve(member.size() + slots_.size() * 32);
+    for (std::size_t i = 0; i < slots_.size(); ++i) {
+        const auto& slot = slots_[i];
+        if (snapshot.serialized[i]) {
+            snapshot.digests[i] = Digest(*snapshot.serialized[i]);
+        } else if (slot.present) {
+            // Unchanged: its digest is known since the scan (or the last commit).
+            snapshot.digests[i] = slot.digest ? *slot.digest : Digest(Raw(slot));
+        } else {
+            continue;
+        }
+        if (member.back() != '{') member += ',';
+        member += '"';
+        member += slot.kind->Name();
+        member += "\":\"";
+        member += DigestText(*snapshot.digests[i]);
+        member += '"';
+    }
+    member += '}';
+    snapshot.names.push_back(std::move(member));
     snapshot.pieces.push_back(snapshot.names.back());
     snapshot.pieces.push_back(kTrailer);
-    return snapshot;
 }
 
 void Store::Committed(Snapshot snapshot) {
     for (std::size_t i = 0; i < slots_.size(); ++i) {
-        if (snapshot.digests[i]) slots_[i].digest = snapshot.digests[i];
+        if (i < snapshot.digests.size() && snapshot.digests[i]) slots_[i].digest = snapshot.digests[i];
         if (!snapshot.serialized[i]) continue;
         slots_[i].committed = std::make_unique<std::string>(std::move(*snapshot.serialized[i]));
         slots_[i].present = true;
@@ -552,6 +565,7 @@ void Store::Discard() {
 
 std::string Store::Export() const {
     Snapshot snapshot = TakeSnapshot();
+    AddDigests(snapshot);
     std::size_t size = 0;
     for (auto piece : snapshot.pieces)
         size += piece.size();

@@ -64,17 +64,21 @@ public:
     // document holds (a section written back unchanged, or only re-formatted, is no change).
     bool HasChanges() const;
     // The document with the current content of every section, as the pieces of text that
-    // make it up (they stay valid while the snapshot and this store are unchanged).
+    // make it up (they stay valid while the snapshot and this store are unchanged), up to
+    // its digests: see AddDigests.
     struct Snapshot {
         std::vector<std::optional<std::string>> serialized;  // per section, when re-serialised
-        std::vector<std::optional<std::uint64_t>> digests;   // per section, when written
-        std::vector<std::string> names;                      // the text before each section, then "digests"
+        std::vector<std::optional<std::uint64_t>> digests;   // per section written (AddDigests)
+        std::vector<std::string> names;                      // the texts between the sections
         std::vector<std::string_view> pieces;
     };
     Snapshot TakeSnapshot() const;
     // Whether the sections a snapshot re-serialised differ from the text they were read from.
     bool Differs(const Snapshot& snapshot) const;
-    // After a snapshot was written: its re-serialised sections are the document's now.
+    // Ends a snapshot that is to be written with the digest of each of its sections.
+    void AddDigests(Snapshot& snapshot) const;
+    // After a snapshot was written (AddDigests first): its re-serialised sections and their
+    // digests are the document's now.
     void Committed(Snapshot snapshot);
     // Drops every change since the text was read or last committed: sections are parsed
     // again from their committed text when next used.

@@ -1,12 +1,9 @@
 // Sessions: the document's scan, lazy sections, the state file's life cycle.
 #include <gtest/gtest.h>
-#include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
 #include <unistd.h>
 
 #include <cstdlib>
-#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
@@ -286,16 +283,7 @@ TEST(Document, DigestsTellTheLibrarysSectionsFromEditedOnes) {
     // Text outside the sections may change.
     EXPECT_TRUE(verified(Edited(written, "\n\"ens\":", "\n  \"ens\" : ")));
 
-    // The digest depends on every byte, wherever it falls, and on the length.
-    const std::string bytes(300, 'a');
-    const std::uint64_t digest = TknCtl::Lib::Digest(bytes);
-    for (std::size_t at = 0; at < bytes.size(); at += 7) {
-        std::string changed = bytes;
-        changed[at] = 'b';
-        EXPECT_NE(TknCtl::Lib::Digest(changed), digest) << at;
-    }
-    EXPECT_NE(TknCtl::Lib::Digest(bytes + '\0'), digest);
-    // ...and on nothing else: documents move between machines.
+    // The digest depends on the bytes and on nothing else: documents move between machines.
     // (Whole blocks of 64 bytes go through vector instructions where there are any.)
     EXPECT_EQ(TknCtl::Lib::DigestText(TknCtl::Lib::Digest("{\"ipv6Enabled\":true}")), "ddb5d6327c2f28f1");
     std::string pattern;
@@ -307,7 +295,6 @@ TEST(Document, DigestsTellTheLibrarysSectionsFromEditedOnes) {
     pieces.AddBlocks(std::string_view(pattern).substr(0, 640));
     pieces.AddBlocks(std::string_view(pattern).substr(640, 64));
     EXPECT_EQ(pieces.Finish(std::string_view(pattern).substr(704)), TknCtl::Lib::Digest(pattern));
-    EXPECT_EQ(TknCtl::Lib::ParseDigest(TknCtl::Lib::DigestText(digest)), digest);
 }
 
 TEST(Session, OneAtATimeAndNeededByTheModel) {
@@ -490,39 +477,6 @@ TEST_F(TempDir, ASectionEditedOutsideTheLibraryIsCheckedBeforeTheFileIsUsed) {
         session->Commit();
     }
     EXPECT_TRUE(TknCtl::Lib::Store(Slurp(path), "test").Verify());
-}
-
-TEST_F(TempDir, OnlyARegularFileIsAStateFile) {
-    // (A FIFO: see e2e.sh, where a program that waits for a writer can be timed out.)
-    const fs::path socketPath = dir_ / "socket.json";
-    const int listener = socket(AF_UNIX, SOCK_STREAM, 0);
-    ASSERT_GE(listener, 0);
-    sockaddr_un address{};
-    address.sun_family = AF_UNIX;
-    ASSERT_LT(socketPath.string().size(), sizeof address.sun_path);
-    std::strcpy(address.sun_path, socketPath.c_str());
-    ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
-    close(listener);
-    fs::create_directory(dir_ / "directory.json");
-    fs::create_symlink("socket.json", dir_ / "link.json");
-    const std::pair<fs::path, std::string> cases[] = {
-        {socketPath, "not a regular file (it is a socket)"},
-        {dir_ / "directory.json", "not a regular file (it is a directory)"},
-        {dir_ / "link.json", "not a regular file (it is a socket)"},
-    };
-    for (const auto& [path, fault] : cases) {
-        for (auto mode : {HostSession::OpenMode::kRead, HostSession::OpenMode::kReplace}) {
-            try {
-                HostSession::OpenFile(path, mode);
-                ADD_FAILURE() << path << " was opened";
-            } catch (const StateFileError& e) {
-                EXPECT_EQ(std::string(e.what()), "state file " + path.string() + ": " + fault);
-            }
-        }
-    }
-    // Refused before anything was made beside them.
-    for (const auto& entry : fs::directory_iterator(dir_))
-        EXPECT_EQ(entry.path().extension(), ".json") << entry.path();
 }
 
 TEST_F(TempDir, LockFileIsNotFollowedThroughASymlink) {

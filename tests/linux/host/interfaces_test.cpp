@@ -63,7 +63,7 @@ TEST_F(InterfacesTest, EveryNetstacksDevicesButBridgePortsAndTheLoopbackAreListe
         for (const auto& flag : link["flags"])
             up = up || flag == "UP";
         EXPECT_EQ(record["Enabled"], up) << name;
-        // No switch of its own yet: no connection point.
+        // None of them was made on a port group: no connection point.
         EXPECT_EQ(record["Portgroup"], "N/A");
         EXPECT_EQ(record["QBR Connection"], -1);
     }
@@ -329,27 +329,6 @@ TEST_F(InterfacesTest, ADamagedDocumentIsRefusedAndKept) {
     EXPECT_EQ(result.status, 3);
     EXPECT_TRUE(Has(result.err, document_)) << result.err;
     EXPECT_EQ(Slurp(document_), damaged);
-}
-
-TEST_F(InterfacesTest, AddingAndRemovingInterfacesWaitsForStandardSwitches) {
-    Build();
-    Sh("ip link add tkn3 type veth peer name tkp3");
-    auto add = Hadro("network ip interface add -p Management");
-    EXPECT_EQ(add.status, 1);
-    EXPECT_EQ(add.err,
-              "Unable to add Tarkon network interface. Error was : Adding interfaces needs a standard "
-              "switch, which "
-              "the Linux host does not offer yet\n");
-    const std::string removal =
-        "Unable to remove Tarkon network interface. Error was : Removing interfaces needs a standard switch, "
-        "which "
-        "the Linux host does not offer yet\n";
-    EXPECT_EQ(Hadro("network ip interface remove -p Management").err, removal);
-    EXPECT_EQ(Hadro("network ip interface remove -i tkn3").err, removal);
-    EXPECT_FALSE(ShJson("ip -j link show tkn3").empty());
-    auto unknown = Hadro("network ip interface remove -i tkn4");
-    EXPECT_EQ(unknown.status, 1);
-    EXPECT_EQ(unknown.out, "false\n");
 }
 
 TEST_F(InterfacesTest, AReadNeedsNoPrivilegeAndAChangeNeedsRoot) {

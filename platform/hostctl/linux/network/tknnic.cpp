@@ -7,8 +7,10 @@
 //   TSO MSS           the largest packet the stack hands the device to segment (gso_max_size):
 //                     the kernel's counterpart of the largest segmentation offload
 //   RX queues         the device's receive queues
-//   connection point,
-//   port              none: the Linux host has no switches of its own yet ("N/A", -1, empty)
+//   connection point  the port group of an interface the host made on one (network/tknnic.h:
+//                     a veth pair whose bridge end is a port of the port group); none for
+//                     every other device ("N/A", -1)
+//   port              none: a bridge port has no ID the host's port commands know
 //   IPv4              the device's first address; leased (it expires: a DHCP client keeps it)
 //                     shows as DHCP. A static setting makes it the device's only IPv4 address.
 //   gateways          the default route of the netstack's main table through the device (of
@@ -23,6 +25,14 @@
 //
 // Turning IPv6 off makes the kernel drop the device's addresses: the static ones are kept in
 // the host's document and given back when IPv6 is turned on again.
+//
+// Interfaces are added on port groups as veth pairs (network/tknnic.h): the named end made in
+// its netstack's namespace by the same request that makes the bridge end in the default one,
+// the bridge end connected to the port group by the switches area (its VLAN, security and
+// shaping), then the kernel read back; a step that fails takes the pair away again. Removing
+// one disconnects and deletes the bridge end, which takes the named end with it; the kernel
+// drops the routes and neighbour entries through it; its tags and kept addresses leave the
+// host's document. Devices the host did not make so are not removed.
 #include <linux/if_addr.h>
 #include <linux/rtnetlink.h>
 #include <sys/socket.h>
@@ -31,16 +41,23 @@
 #include <climits>
 #include <memory>
 #include <nlohmann/json.hpp>
+#include <random>
 #include <unordered_map>
 
 #include "backend/interfaces.h"
 #include "core/context.h"
 #include "core/text.h"
 #include "hostctl/exception.h"
+#include "hostctl/network/vswitch.h"
+#include "kernel/bridges.h"
 #include "kernel/request.h"
 #include "kernel/sysctl.h"
+#include "kernel/veth.h"
+#include "model/tknnics.h"
 #include "network/areas.h"
 #include "network/kernel_view.h"
+#include "network/tknnic.h"
+#include "network/vswitch.h"
 
 namespace TknCtl::Linux {
 
@@ -57,11 +74,10 @@ using HostCtl::Network::MacAddress;
 using HostCtl::Network::TknNicTagType;
 using nlohmann::json;
 
+using HostCtl::Network::ConnectionPoint;
+
 constexpr const char* kMember = "interfaces";
-constexpr const char* kNoAdd =
-    "Adding interfaces needs a standard switch, which the Linux host does not offer yet";
-constexpr const char* kNoRemove =
-    "Removing interfaces needs a standard switch, which the Linux host does not offer yet";
+constexpr const char* kBridgeEndSuffix = "-port";
 
 // Routes the interfaces area adds are an administrator's (RTPROT_STATIC); a DHCP client's or
 // the kernel's from router advertisements are learned.
@@ -103,9 +119,29 @@ std::string NetworkText(const Kernel::Address& address) {
     return address.address + "/" + std::to_string(address.prefixLength);
 }
 
+// The port group a connection point names; a kind of connection point the Linux host lacks
+// is refused.
+std::string PortGroupOf(const ConnectionPoint& point) {
+    switch (point.GetConnectionType()) {
+        case ConnectionPoint::TYPE_PORTGROUP:
+            return point.GetPortGroupName();
+        case ConnectionPoint::TYPE_DVPORT:
+            throw HostCtlException("Distributed port " + Quote(point.GetDVPortParam().GetPortId()) +
+                                   " cannot be a connection point: there is no distributed switch on a Linux "
+                                   "host");
+        case ConnectionPoint::TYPE_OPAQUE_NETWORK:
+            throw HostCtlException("Opaque network " + Quote(point.GetOpaqueNetworkParam().GetNetworkId()) +
+                                   " cannot be a connection point: opaque networks belong to distributed "
+                                   "switches, and there is no distributed switch on a Linux host");
+        default:
+            break;
+    }
+    throw HostCtlException("Unknown connection point type " + std::to_string(point.GetConnectionType()));
+}
+
 class LinuxInterfaces final : public Backend::Interfaces {
 public:
-    explicit LinuxInterfaces(Context& context) : context_(context), views_(context) {}
+    explicit LinuxInterfaces(Context& context) : context_(context), views_(context), switches_(context) {}
 
     std::vector<InterfaceId> List(const std::string& netstack) override {
         std::vector<InterfaceId> out;
@@ -245,8 +281,12 @@ public:
     }
 
     std::unique_ptr<HostCtl::Network::ConnectionPoint> GetConnectionPoint(const InterfaceId& id) override {
-        Require(id);
-        return nullptr;  // no switches of its own yet: no port group or distributed port
+        auto end = BridgeEndOf(id);
+        if (!end) return nullptr;
+        const auto ports = switches_.ConnectedPorts();
+        auto group = ports.find(end->name);
+        if (group == ports.end()) return nullptr;  // taken out of its bridge
+        return std::make_unique<TknCtl::Network::PortGroupImpl>(group->second);
     }
 
     std::unique_ptr<HostCtl::Network::Port> GetPort(const InterfaceId& id) override {
@@ -305,22 +345,243 @@ public:
         return out;
     }
 
-    InterfaceId Add(const HostCtl::Network::ConnectionPoint&, const std::string&, const IpConfig&,
-                    const MacAddress&, unsigned, unsigned, unsigned, const std::string&) override {
-        throw HostCtlException(kNoAdd);
+    std::optional<InterfaceId> AttachedAt(const ConnectionPoint& point) override {
+        const std::string group = PortGroupOf(point);
+        for (const auto& [port, holder] : switches_.ConnectedPorts()) {
+            if (holder != group) continue;
+            if (auto id = InterfaceOfPort(port)) return id;
+        }
+        return std::nullopt;
+    }
+
+    void CheckAttachable(const ConnectionPoint& point) override { SwitchOf(PortGroupOf(point)); }
+
+    bool MacInUse(const MacAddress& mac) override {
+        if (mac.IsZero()) return false;
+        for (const auto& netstack : context_.Netstacks()) {
+            try {
+                for (const auto& link : views_.Of(netstack).Links()) {
+                    if (MacOf(link) == mac) return true;
+                }
+            } catch (const HostCtlException&) {
+                // A netstack the program cannot enter: only a change would need it, and a
+                // change is refused to whoever cannot enter it.
+                if (netstack == Context::kDefaultNetstack) throw;
+            }
+        }
+        return false;
+    }
+
+    InterfaceId Add(const ConnectionPoint& point, const std::string& netstack, const MacAddress& mac,
+                    unsigned tsoMss, unsigned mtu, unsigned rxQueues, const std::string& name) override {
+        const std::string group = PortGroupOf(point);
+        const auto vswitch = SwitchOf(group);
+        context_.BeginChange();
+        auto& target = views_.Of(netstack);
+        const std::string chosen = name.empty() ? FreeName(target) : name;
+        if (target.LinkByName(chosen)) {
+            throw HostCtlException("Netstack " + Quote(netstack) + " has a network device named " + chosen +
+                                   " already");
+        }
+        const std::string end = BridgeEndName(chosen);
+        if (views_.Of(Context::kDefaultNetstack).LinkByName(end)) {
+            throw HostCtlException("The bridge end of " + chosen + " would be " + end +
+                                   ", the name of another network device of netstack " +
+                                   Quote(Context::kDefaultNetstack));
+        }
+
+        Kernel::VethPair pair;
+        pair.end.name = end;
+        pair.end.mac = BridgeEndMac(RandomBytes());
+        pair.end.mtu = static_cast<unsigned>(vswitch.mtu);
+        pair.peer.name = chosen;
+        if (!mac.IsZero()) pair.peer.mac = mac.GetStringAddress();
+        pair.peer.mtu = mtu;
+        pair.peer.rxQueues = rxQueues;
+        pair.peer.gsoMaxSize = tsoMss;
+        const InterfaceId id{target.Netstack(), chosen};
+        Kernel::AddVeth(Kernel::Namespace::Own(), pair, target.Namespace());
+        try {
+            Kernel::LinkChange up;
+            up.up = true;
+            Kernel::ChangeLink(target.Namespace(), chosen, up);
+            Kernel::ChangeLink(Kernel::Namespace::Own(), end, up);
+            switches_.ConnectPort(group, end);
+            CheckMade(id, pair, group);
+        } catch (...) {
+            TakeAway(id, end);
+            throw;
+        }
+        ForgetDocumented(id);
+        return id;
     }
 
     void Remove(const InterfaceId& id) override {
-        Require(id);
-        throw HostCtlException(kNoRemove);
-    }
-
-    void RemoveAt(const HostCtl::Network::ConnectionPoint&, const std::string&) override {
-        throw HostCtlException(kNoRemove);
+        auto end = BridgeEndOf(id);
+        if (!end) {
+            throw HostCtlException("Tarkon network interface " + Describe(id) +
+                                   " was not made on a port group: the Linux host removes only the "
+                                   "interfaces it made there (a veth pair whose other end, " +
+                                   BridgeEndName(id.name) + ", is a port of a standard switch)");
+        }
+        context_.BeginChange();
+        switches_.DisconnectPort(end->name);
+        const auto own = Kernel::Namespace::Own();
+        Kernel::DeleteLink(own, end->index, end->name);
+        Kernel::Changed();
+        if (views_.Of(Context::kDefaultNetstack).LinkByName(end->name) || View(id).LinkByName(id.name))
+            Differs(id, "it is still there after its removal");
+        ForgetDocumented(id);
     }
 
 private:
     NetstackView& View(const InterfaceId& id) { return views_.Of(id.netstack); }
+
+    // ---------------------------------------------------------------- interfaces on port groups
+
+    struct BridgeEnd {
+        std::string name;
+        int index = 0;
+    };
+
+    // The switch of a port group a new interface can attach to: the port group exists and its
+    // switch has a free port.
+    Backend::SwitchState SwitchOf(const std::string& portGroup) {
+        auto group = switches_.FindPortGroup(portGroup);
+        if (!group) throw HostCtlException("Port group " + Quote(portGroup) + " does not exist");
+        auto vswitch = switches_.Read(group->vswitch);
+        if (vswitch.usedPorts >= vswitch.numPorts) {
+            throw HostCtlException("Virtual switch " + vswitch.name + " has no free port (" +
+                                   std::to_string(vswitch.numPorts) + " ports, all in use)");
+        }
+        return vswitch;
+    }
+
+    // The bridge end of an interface the host made on a port group: the device of the default
+    // netstack named after it that is the other end of its veth pair. Nothing for any other
+    // device.
+    std::optional<BridgeEnd> BridgeEndOf(const InterfaceId& id) {
+        const Kernel::Link& link = Require(id);
+        if (link.kind != "veth") return std::nullopt;
+        const int index = link.index;
+        const int peer = link.peer;
+        const auto* end = views_.Of(Context::kDefaultNetstack).LinkByName(BridgeEndName(id.name));
+        if (!end || end->kind != "veth" || end->index != peer || end->peer != index) return std::nullopt;
+        return BridgeEnd{end->name, end->index};
+    }
+
+    // The interface whose bridge end is the port, or nothing.
+    std::optional<InterfaceId> InterfaceOfPort(const std::string& port) {
+        auto name = InterfaceOfBridgeEnd(port);
+        if (!name) return std::nullopt;
+        for (const auto& netstack : context_.Netstacks()) {
+            try {
+                InterfaceId id{netstack, *name};
+                if (!views_.Of(netstack).IpInterface(*name)) continue;
+                if (auto end = BridgeEndOf(id); end && end->name == port) return id;
+            } catch (const HostCtlException&) {
+                if (netstack == Context::kDefaultNetstack) throw;
+            }
+        }
+        return std::nullopt;
+    }
+
+    // The lowest "tknN" that no interface of the host has, no device of the target netstack
+    // has, and whose bridge end's name is free.
+    std::string FreeName(NetstackView& target) {
+        return FreeInterfaceName([&](const std::string& name) {
+            if (target.LinkByName(name) ||
+                views_.Of(Context::kDefaultNetstack).LinkByName(BridgeEndName(name)))
+                return true;
+            for (const auto& netstack : context_.Netstacks()) {
+                try {
+                    if (views_.Of(netstack).LinkByName(name)) return true;
+                } catch (const HostCtlException&) {
+                    if (netstack == Context::kDefaultNetstack) throw;
+                }
+            }
+            return false;
+        });
+    }
+
+    static std::array<std::uint8_t, 5> RandomBytes() {
+        std::random_device source;
+        std::array<std::uint8_t, 5> bytes{};
+        for (auto& byte : bytes)
+            byte = static_cast<std::uint8_t>(source());
+        return bytes;
+    }
+
+    // Reads the kernel back after an interface was made: both ends there, as asked, the bridge
+    // end connected to the port group.
+    void CheckMade(const InterfaceId& id, const Kernel::VethPair& pair, const std::string& group) {
+        const auto* link = View(id).LinkByName(id.name);
+        if (!link) Differs(id, "it is not there after it was made");
+        std::string differs;
+        if (link->kind != "veth")
+            differs = "it is a " + (link->kind.empty() ? "device" : link->kind + " device");
+        else if (link->mtu != pair.peer.mtu)
+            differs = "its MTU is " + std::to_string(link->mtu);
+        else if (!pair.peer.mac.empty() && link->mac != pair.peer.mac)
+            differs = "its MAC address is " + link->mac;
+        else if (link->numRxQueues != pair.peer.rxQueues)
+            differs = "it has " + std::to_string(link->numRxQueues) + " receive queues";
+        else if (link->gsoMaxSize != pair.peer.gsoMaxSize)
+            differs = "its TSO MSS is " + std::to_string(link->gsoMaxSize);
+        else if (!link->up)
+            differs = "it is down";
+        else if (!BridgeEndOf(id))
+            differs = "its other end is not " + pair.end.name;
+        else if (!views_.Of(Context::kDefaultNetstack).LinkByName(pair.end.name)->up)
+            differs = "its bridge end " + pair.end.name + " is down";
+        if (differs.empty()) {
+            const auto ports = switches_.ConnectedPorts();
+            auto connected = ports.find(pair.end.name);
+            if (connected == ports.end() || connected->second != group)
+                differs = "its bridge end " + pair.end.name + " is not connected to port group " + group;
+        }
+        if (!differs.empty()) Differs(id, differs);
+    }
+
+    // Takes an interface made here away again, with its bridge end's connection.
+    void TakeAway(const InterfaceId& id, const std::string& end) {
+        try {
+            switches_.DisconnectPort(end);
+        } catch (const HostCtlException& e) {
+            context_.Warn(end + " could not be disconnected again: " + e.GetMessage());
+        }
+        try {
+            const auto own = Kernel::Namespace::Own();
+            if (auto link = Kernel::FindLink(own, end)) Kernel::DeleteLink(own, link->index, end);
+            Kernel::Changed();
+        } catch (const HostCtlException& e) {
+            context_.Warn(Describe(id) + " could not be removed again: " + e.GetMessage());
+        }
+    }
+
+    // What the document keeps of an interface (tags, IPv6 addresses kept while IPv6 is off)
+    // goes: an interface made anew starts without, one removed leaves nothing behind.
+    void ForgetDocumented(const InterfaceId& id) {
+        const json& member = context_.GetDocument().Read(kMember);
+        auto holds = [&](const char* what) {
+            if (!member.is_object()) return false;
+            auto byNetstack = member.find(what);
+            if (byNetstack == member.end() || !byNetstack->is_object()) return false;
+            auto names = byNetstack->find(id.netstack);
+            return names != byNetstack->end() && names->is_object() && names->contains(id.name);
+        };
+        if (!holds("tags") && !holds("keptIpv6")) return;
+        json& written = context_.GetDocument().Write(kMember);
+        for (const char* what : {"tags", "keptIpv6"}) {
+            auto byNetstack = written.find(what);
+            if (byNetstack == written.end() || !byNetstack->is_object()) continue;
+            auto names = byNetstack->find(id.netstack);
+            if (names == byNetstack->end() || !names->is_object()) continue;
+            names->erase(id.name);
+            if (names->empty()) byNetstack->erase(id.netstack);
+            if (byNetstack->empty()) written.erase(what);
+        }
+    }
 
     const Kernel::Link& Require(const InterfaceId& id) {
         const auto* link = View(id).IpInterface(id.name);
@@ -735,6 +996,7 @@ private:
 
     Context& context_;
     KernelViews views_;
+    LinuxSwitches switches_;
     std::unordered_map<std::string, std::pair<unsigned long, IpConfig>> configs_;
 };
 
@@ -775,6 +1037,32 @@ std::string ConfigDifference(const IpConfig& before, const IpConfig& wanted, con
             return "it still has the IPv6 address " + n.GetStringAddress();
     }
     return {};
+}
+
+std::string BridgeEndName(const std::string& interface) {
+    return interface + kBridgeEndSuffix;
+}
+
+std::optional<std::string> InterfaceOfBridgeEnd(const std::string& port) {
+    const std::string suffix = kBridgeEndSuffix;
+    if (port.size() <= suffix.size() || port.compare(port.size() - suffix.size(), suffix.size(), suffix) != 0)
+        return std::nullopt;
+    std::string name = port.substr(0, port.size() - suffix.size());
+    if (!Model::IsTknNicName(name)) return std::nullopt;
+    return name;
+}
+
+std::string BridgeEndMac(const std::array<std::uint8_t, 5>& bytes) {
+    std::array<std::uint8_t, 6> all{0xfe, bytes[0], bytes[1], bytes[2], bytes[3], bytes[4]};
+    return MacAddress(all).GetStringAddress();
+}
+
+std::string FreeInterfaceName(const std::function<bool(const std::string&)>& taken) {
+    for (int n = 0; n <= 255; ++n) {
+        std::string name = "tkn" + std::to_string(n);
+        if (!taken(name)) return name;
+    }
+    throw HostCtlException("No free Tarkon network interface name: tkn0 to tkn255 are all in use");
 }
 
 std::unique_ptr<Backend::Interfaces> MakeInterfaces(Context& context) {

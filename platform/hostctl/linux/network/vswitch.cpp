@@ -3,6 +3,7 @@
 #include "network/vswitch.h"
 
 #include "network/pnic.h"
+#include "network/tknnic.h"
 
 #include <unistd.h>
 
@@ -586,11 +587,15 @@ void LinuxSwitches::SetMtu(const std::string& name, int mtu) {
         }
     }
     // The uplinks carry the switch's frames: they take its MTU first, so that the bridge never
-    // sends them a frame they cannot carry. A refusal puts back what was changed.
+    // sends them a frame they cannot carry; so do the bridge ends of interfaces (network/tknnic.h).
+    // A refusal puts back what was changed.
+    auto carries = [&](const Kernel::BridgeLink& port) {
+        return IsNic(port) || InterfaceOfBridgeEnd(port.name).has_value();
+    };
     std::vector<std::pair<std::string, unsigned>> changed;
     try {
         for (const auto* port : view.PortsOf(bridge)) {
-            if (!IsNic(*port) || port->mtu == wanted) continue;
+            if (!carries(*port) || port->mtu == wanted) continue;
             Kernel::ChangeLink(own, port->name, Mtu(wanted));
             changed.emplace_back(port->name, port->mtu);
         }
@@ -609,7 +614,7 @@ void LinuxSwitches::SetMtu(const std::string& name, int mtu) {
     const auto& after = Bridge(view, name);
     std::string differs = after.mtu != wanted ? name : std::string();
     for (const auto* port : view.PortsOf(after)) {
-        if (IsNic(*port) && port->mtu != wanted) differs = port->name;
+        if (carries(*port) && port->mtu != wanted) differs = port->name;
     }
     if (!differs.empty()) {
         throw HostCtlException("The MTU of " + differs + " is not " + std::to_string(mtu) +

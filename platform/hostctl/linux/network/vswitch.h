@@ -199,6 +199,9 @@ public:
     // A port leaves its port group and its bridge, without the switch's shaping (before the
     // interface's veth pair goes). Nothing when it is no port group's.
     void DisconnectPort(const std::string& port);
+    // The ports connected to port groups now (kept as a port group's, and a port of its
+    // switch's bridge), with the port group of each.
+    std::map<std::string, std::string> ConnectedPorts();
 
 private:
     // The namespace's links at one moment, as a switch sees them.

@@ -207,6 +207,22 @@ void LinuxSwitches::DisconnectPort(const std::string& port) {
     Store(std::move(records), view);
 }
 
+std::map<std::string, std::string> LinuxSwitches::ConnectedPorts() {
+    auto view = Look();
+    std::map<std::string, std::string> ports;
+    for (const auto& [vswitch, record] : Records()) {
+        const auto* bridge = view.Find(vswitch);
+        if (!bridge || !bridge->bridge) continue;
+        for (const auto& group : record.portGroups) {
+            for (const auto& port : group.ports) {
+                const auto* link = view.Find(port);
+                if (link && link->master == bridge->index) ports[port] = group.name;
+            }
+        }
+    }
+    return ports;
+}
+
 void LinuxSwitches::ApplyVlans(const View& view, const Kernel::BridgeLink& bridge,
                                const SwitchRecord& record) {
     std::vector<std::uint16_t> ids;

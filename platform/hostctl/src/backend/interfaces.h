@@ -1,11 +1,14 @@
-// IP interfaces of a real host: their addresses, gateways, IPv6 settings and tags.
+// IP interfaces of a real host: their addresses, gateways, IPv6 settings and tags, and the
+// interfaces created at connection points.
 //
 // The operations (TknCtl::Network::TarkonNicInfoImpl and the interface objects it hands out,
 // src/network/tknnic*.cpp) keep the rules every host shares: a static IPv4 address is a
 // unicast host address with a contiguous netmask, unique on its netstack, its gateway on its
 // subnet; IPv6 addresses and gateways are unicast; an MTU lies within TknNic::MIN_MTU and
-// MAX_MTU; a tag is one of the known types and is removed only where it is set. This area
-// reads the host and carries out or refuses what passed them.
+// MAX_MTU; a tag is one of the known types and is removed only where it is set; a new
+// interface is named "tkn0" to "tkn255" by a name no interface has, its MAC address is unicast
+// and unused, and a connection point carries one interface. This area reads the host and
+// carries out or refuses what passed them.
 #pragma once
 
 #include <memory>
@@ -71,13 +74,29 @@ public:
     virtual std::vector<HostCtl::Network::TknNic::MulticastGroup> GetMulticastGroups(
         const InterfaceId& id) = 0;
 
-    // Creating and removing interfaces (the arguments of TarkonNicInfoImpl::AddTarkonNic and
-    // RemoveTarkonNic); each throws HostCtlException when the host cannot.
+    // ---- creating and removing interfaces (TarkonNicInfoImpl::AddTarkonNic, RemoveTarkonNic,
+    // TknNic::Remove): the operation checks names, sizes and addresses and composes the rules
+    // between them; the host says what it holds and carries the change out.
+
+    // The interface attached at a connection point, or nothing. Throws HostCtlException for a
+    // kind of connection point the host does not have, saying why.
+    virtual std::optional<InterfaceId> AttachedAt(const HostCtl::Network::ConnectionPoint& point) = 0;
+    // Throws HostCtlException when a new interface cannot attach at the connection point (it
+    // does not exist, its switch has no free port, the host has no such connection points);
+    // changes nothing.
+    virtual void CheckAttachable(const HostCtl::Network::ConnectionPoint& point) = 0;
+    // Whether a device of the host (of any netstack it can read) has that link-layer address.
+    virtual bool MacInUse(const HostCtl::Network::MacAddress& mac) = 0;
+    // Creates an interface at a connection point, on a netstack the host has, enabled and
+    // without IP configuration (the operation gives it one): name empty: the lowest free
+    // "tknN"; mac unset: one of the host's choosing; tsoMss, mtu and rxQueues as checked by the
+    // operation. Throws HostCtlException when the host cannot; nothing is left behind then.
     virtual InterfaceId Add(const HostCtl::Network::ConnectionPoint& point, const std::string& netstack,
-                            const HostCtl::Network::IpConfig& config, const HostCtl::Network::MacAddress& mac,
-                            unsigned tsoMss, unsigned mtu, unsigned rxQueues, const std::string& name) = 0;
+                            const HostCtl::Network::MacAddress& mac, unsigned tsoMss, unsigned mtu,
+                            unsigned rxQueues, const std::string& name) = 0;
+    // Removes an interface the host created at a connection point, with what refers to it (its
+    // port, routes, neighbours, tags); refuses others, saying why.
     virtual void Remove(const InterfaceId& id) = 0;
-    virtual void RemoveAt(const HostCtl::Network::ConnectionPoint& point, const std::string& netstack) = 0;
 };
 
 }  // namespace TknCtl::Backend

@@ -1,9 +1,11 @@
 // Tarkon network interfaces: tags, the information object, creation and removal.
 #include <algorithm>
 #include <functional>
+#include <optional>
 
 #include "backend/host.h"
 #include "backend/interfaces.h"
+#include "backend/netstacks.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -81,6 +83,140 @@ bool MacInUse(const HostCtl::Network::MacAddress& mac) {
         return true;
     const auto& ports = Lib::Read<Model::PortsSection>().ports;
     return std::any_of(ports.begin(), ports.end(), [&](const Model::Port& p) { return p.mac == mac; });
+}
+
+// The rules of a new interface every host keeps, in the order they are checked.
+void CheckNewName(const std::string& name) {
+    if (!Model::IsTknNicName(name)) {
+        throw HostCtlException("Invalid Tarkon network interface name " + Lib::Quote(name) +
+                               ": it must be tkn followed by a number from 0 to 255");
+    }
+}
+
+[[noreturn]] void NameTaken(const std::string& name) {
+    throw HostCtlException("A Tarkon network interface named " + name + " already exists");
+}
+
+[[noreturn]] void NoSuchNetstack(const std::string& key) {
+    throw HostCtlException("Netstack instance " + Lib::Quote(key) + " does not exist");
+}
+
+void CheckUnicast(const HostCtl::Network::MacAddress& mac) {
+    if (!mac.IsUnicast()) {
+        throw HostCtlException("MAC address " + mac.GetStringAddress() +
+                               " is a group address; an interface needs a unicast address");
+    }
+}
+
+[[noreturn]] void MacTaken(const HostCtl::Network::MacAddress& mac) {
+    throw HostCtlException("MAC address " + mac.GetStringAddress() + " is already in use");
+}
+
+// An MTU, a number of RX dispatch queues and a TSO MSS asked for (0: the host's default).
+void CheckSizes(unsigned mtu, unsigned rxQueues, unsigned tsoMss) {
+    if (mtu != 0 &&
+        (mtu < static_cast<unsigned>(TknNic::MIN_MTU) || mtu > static_cast<unsigned>(TknNic::MAX_MTU))) {
+        throw HostCtlException("Invalid MTU " + std::to_string(mtu) + ": it must be between " +
+                               std::to_string(TknNic::MIN_MTU) + " and " + std::to_string(TknNic::MAX_MTU));
+    }
+    if (rxQueues > TknNic::MAX_RX_DISP_QUEUES) {
+        throw HostCtlException("Invalid number of RX dispatch queues " + std::to_string(rxQueues) +
+                               ": it must be between 1 and " + std::to_string(TknNic::MAX_RX_DISP_QUEUES));
+    }
+    if (tsoMss > TknNic::DEFAULT_TSO_MSS) {
+        throw HostCtlException("Invalid TSO MSS " + std::to_string(tsoMss) + ": it must be at most " +
+                               std::to_string(TknNic::DEFAULT_TSO_MSS));
+    }
+}
+
+// A connection point of a real host, as messages name it.
+std::string DescribeRealConnection(const HostCtl::Network::ConnectionPoint& point) {
+    if (point.GetConnectionType() == HostCtl::Network::ConnectionPoint::TYPE_PORTGROUP)
+        return "port group " + Lib::Quote(point.GetPortGroupName());
+    return "connection point";
+}
+
+// AddTarkonNic on a real host: the rules of the simulated host, in its order, the host
+// answering for what it holds; then the netstack (a dedicated one is made, one kept disabled
+// is enabled), the interface and its IP configuration. A step that fails takes back what the
+// steps before it did.
+std::unique_ptr<TknNic> AddRealTknNic(Backend::Host& host, const HostCtl::Network::ConnectionPoint& point,
+                                      const std::string& netstack, const HostCtl::Network::IpConfig& config,
+                                      const HostCtl::Network::MacAddress& mac, unsigned tsoMss, unsigned mtu,
+                                      unsigned rxQueues, const std::string& name) {
+    auto& area = host.GetInterfaces();
+    if (auto attached = area.AttachedAt(point)) {
+        throw HostCtlException("The " + DescribeRealConnection(point) +
+                               " already has a Tarkon network interface (" + attached->name + ")");
+    }
+    area.CheckAttachable(point);
+    if (!name.empty()) {
+        CheckNewName(name);
+        if (area.Find(name)) NameTaken(name);
+    }
+    auto& netstacks = host.GetNetstacks();
+    const auto entry = netstacks.Find(netstack);
+    if (!entry && !IsDedicatedNetstack(netstack)) NoSuchNetstack(netstack);
+    if (!mac.IsZero()) {
+        CheckUnicast(mac);
+        if (area.MacInUse(mac)) MacTaken(mac);
+    }
+    CheckSizes(mtu, rxQueues, tsoMss);
+
+    bool made = false;
+    bool enabled = false;
+    if (!entry) {
+        // What the simulated host gives a netstack it makes.
+        const Model::Netstack defaults;
+        Backend::NetstackSettings settings;
+        settings.maxConnections = defaults.maxConnections;
+        settings.congestionControl = defaults.congestionControl;
+        settings.ipv6Enabled = defaults.ipv6Enabled;
+        netstacks.Add(netstack, netstack, settings, false);
+        made = true;
+    } else if (!entry->enabled) {
+        netstacks.Enable(netstack);
+        enabled = true;
+    }
+    // Takes back what was done for the interface; a failure of that is told with the failure
+    // that led to it.
+    auto undo = [&](const std::string& failure, const std::optional<Backend::InterfaceId>& id) {
+        std::string left;
+        if (id) {
+            try {
+                area.Remove(*id);
+            } catch (const HostCtlException& e) {
+                left += "; " + id->name + " could not be removed again: " + e.GetMessage();
+            }
+        }
+        try {
+            if (made) netstacks.Remove(netstack, false);
+            if (enabled) netstacks.Disable(netstack);
+        } catch (const HostCtlException& e) {
+            left += "; netstack instance " + Lib::Quote(netstack) + (made ? " made" : " enabled") +
+                    " for it could not be " + (made ? "removed" : "disabled") + " again: " + e.GetMessage();
+        }
+        if (!left.empty()) throw HostCtlException(failure + left);
+    };
+    std::optional<Backend::InterfaceId> id;
+    try {
+        id = area.Add(point, netstack, mac, tsoMss != 0 ? tsoMss : TknNic::DEFAULT_TSO_MSS,
+                      mtu != 0 ? mtu : TknNic::DEFAULT_MTU,
+                      rxQueues != 0 ? rxQueues : TknNic::DEFAULT_RX_DISP_QUEUES, name);
+        auto nic = std::make_unique<RealTknNic>(*id);
+        nic->SetIpConfig(config);
+        return nic;
+    } catch (const HostCtlException& failure) {
+        undo(failure.GetMessage(), id);
+        throw;
+    } catch (...) {
+        try {
+            undo({}, id);
+        } catch (const HostCtlException&) {
+            // the first failure is the one told
+        }
+        throw;
+    }
 }
 
 // A unique locally administered address: 02:48:44:00:xx:yy, the lowest free from :00:10 on.
@@ -168,10 +304,8 @@ std::unique_ptr<TknNic> TarkonNicInfoImpl::AddTarkonNic(HostCtl::Network::Connec
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::AddTarkonNic", netstack,
                Lib::Args(name, mac.IsZero() ? std::string() : mac.GetStringAddress(), tsoMss, mtu, rxQueues));
     if (!connectionPoint) throw HostCtlException("A Tarkon network interface needs a connection point");
-    if (auto* host = Lib::RealHost()) {
-        return std::make_unique<RealTknNic>(
-            host->GetInterfaces().Add(*connectionPoint, netstack, config, mac, tsoMss, mtu, rxQueues, name));
-    }
+    if (auto* host = Lib::RealHost())
+        return AddRealTknNic(*host, *connectionPoint, netstack, config, mac, tsoMss, mtu, rxQueues, name);
 
     // Everything is checked before anything changes.
     Model::TknNic nic;
@@ -181,49 +315,26 @@ std::unique_ptr<TknNic> TarkonNicInfoImpl::AddTarkonNic(HostCtl::Network::Connec
     if (name.empty()) {
         nic.name = FreeName();
     } else {
-        if (!Model::IsTknNicName(name)) {
-            throw HostCtlException("Invalid Tarkon network interface name " + Lib::Quote(name) +
-                                   ": it must be tkn followed by a number from 0 to 255");
-        }
-        if (Lib::Read<Model::TknNicsSection>().Find(name)) {
-            throw HostCtlException("A Tarkon network interface named " + name + " already exists");
-        }
+        CheckNewName(name);
+        if (Lib::Read<Model::TknNicsSection>().Find(name)) NameTaken(name);
         nic.name = name;
     }
 
     const auto* stack = Lib::Read<Model::NetstacksSection>().Find(netstack);
-    if (!stack && !IsDedicatedNetstack(netstack)) {
-        throw HostCtlException("Netstack instance " + Lib::Quote(netstack) + " does not exist");
-    }
+    if (!stack && !IsDedicatedNetstack(netstack)) NoSuchNetstack(netstack);
     nic.netstack = netstack;
 
     if (mac.IsZero()) {
         nic.mac = FreeMac();
     } else {
-        if (!mac.IsUnicast()) {
-            throw HostCtlException("MAC address " + mac.GetStringAddress() +
-                                   " is a group address; an interface needs a unicast address");
-        }
-        if (MacInUse(mac))
-            throw HostCtlException("MAC address " + mac.GetStringAddress() + " is already in use");
+        CheckUnicast(mac);
+        if (MacInUse(mac)) MacTaken(mac);
         nic.mac = mac;
     }
 
-    if (mtu != 0 &&
-        (mtu < static_cast<unsigned>(TknNic::MIN_MTU) || mtu > static_cast<unsigned>(TknNic::MAX_MTU))) {
-        throw HostCtlException("Invalid MTU " + std::to_string(mtu) + ": it must be between " +
-                               std::to_string(TknNic::MIN_MTU) + " and " + std::to_string(TknNic::MAX_MTU));
-    }
+    CheckSizes(mtu, rxQueues, tsoMss);
     nic.mtu = mtu != 0 ? mtu : TknNic::DEFAULT_MTU;
-    if (rxQueues > TknNic::MAX_RX_DISP_QUEUES) {
-        throw HostCtlException("Invalid number of RX dispatch queues " + std::to_string(rxQueues) +
-                               ": it must be between 1 and " + std::to_string(TknNic::MAX_RX_DISP_QUEUES));
-    }
     nic.rxDispQueues = rxQueues != 0 ? rxQueues : TknNic::DEFAULT_RX_DISP_QUEUES;
-    if (tsoMss > TknNic::DEFAULT_TSO_MSS) {
-        throw HostCtlException("Invalid TSO MSS " + std::to_string(tsoMss) + ": it must be at most " +
-                               std::to_string(TknNic::DEFAULT_TSO_MSS));
-    }
     nic.tsoMss = tsoMss != 0 ? tsoMss : TknNic::DEFAULT_TSO_MSS;
     nic.enabled = true;
     nic.ipConfig = Internal::CheckedIpConfig(nic, nullptr, config);
@@ -253,7 +364,21 @@ void TarkonNicInfoImpl::RemoveTarkonNic(HostCtl::Network::ConnectionPoint* conne
                                         const std::string& netstack) {
     Lib::Enter("TknCtl::Network::TarkonNicInfoImpl::RemoveTarkonNic", netstack);
     if (!connectionPoint) throw HostCtlException("No connection point given");
-    if (auto* host = Lib::RealHost()) return host->GetInterfaces().RemoveAt(*connectionPoint, netstack);
+    if (auto* host = Lib::RealHost()) {
+        auto& area = host->GetInterfaces();
+        auto id = area.AttachedAt(*connectionPoint);
+        if (!id) {
+            throw HostCtlException("No Tarkon network interface is attached to " +
+                                   DescribeRealConnection(*connectionPoint));
+        }
+        if (id->netstack != netstack) {
+            throw HostCtlException("The Tarkon network interface at " +
+                                   DescribeRealConnection(*connectionPoint) + " (" + id->name +
+                                   ") belongs to netstack " + Lib::Quote(id->netstack) + ", not " +
+                                   Lib::Quote(netstack));
+        }
+        return area.Remove(*id);
+    }
     Model::ConnectionPoint point = Internal::ToModelConnection(*connectionPoint);
     for (const auto& nic : Lib::Read<Model::TknNicsSection>().nics) {
         if (!Internal::SameConnection(nic.connection, point)) continue;

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "backend/host.h"
+#include "backend/switches.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "core/text.h"
@@ -23,17 +24,17 @@ using HostCtl::Network::ConnectionPoint;
 
 std::string PortGroupImpl::GetPortsetName() const {
     Lib::Enter("TknCtl::Network::PortGroupImpl::GetPortsetName", name_);
-    // A real host knows no port groups until it has standard switches of its own.
-    if (Lib::RealHost()) return {};
+    if (auto* host = Lib::RealHost()) {
+        auto group = host->GetSwitches().FindPortGroup(name_);
+        return group ? group->vswitch : std::string();
+    }
     const auto* vswitch = Lib::Read<Model::VSwitchesSection>().FindPortGroupSwitch(name_);
     return vswitch ? vswitch->name : std::string();
 }
 
 bool PortGroupImpl::IsValid() const {
     Lib::Enter("TknCtl::Network::PortGroupImpl::IsValid", name_);
-    // A real host judges a connection point when an interface is attached to it or taken from
-    // it (TarkonNicInfoImpl::AddTarkonNic, RemoveTarkonNic), where it can say why it cannot.
-    if (Lib::RealHost()) return true;
+    if (auto* host = Lib::RealHost()) return host->GetSwitches().FindPortGroup(name_).has_value();
     return Lib::Read<Model::VSwitchesSection>().FindPortGroup(name_) != nullptr;
 }
 

@@ -59,6 +59,9 @@ TEST_F(NetstacksTest, AddMakesANamespaceWithTheNetstacksSettings) {
     EXPECT_EQ(Sysctl("glidex", "net.ipv4.tcp_congestion_control"), "reno");
     EXPECT_EQ(Sysctl("glidex", "net.ipv6.conf.all.disable_ipv6"), "0");
     EXPECT_TRUE(std::filesystem::is_directory("/etc/netns/glidex"));
+    // Unlike `ip netns add`, its loopback is up: a netstack reaches itself from the start.
+    EXPECT_EQ(ShJson("ip -n glidex -j link show lo")[0]["operstate"], "UNKNOWN");
+    EXPECT_NE(Sh("ip -n glidex link show lo").find(",UP,"), std::string::npos);
     // As `ip netns add` leaves it: /run/netns a shared mount point, the namespace bound in it.
     EXPECT_NE(Sh("findmnt -no PROPAGATION /run/netns").find("shared"), std::string::npos);
     EXPECT_EQ(Sh("findmnt -no FSTYPE /run/netns/glidex"), "nsfs\n");

@@ -143,9 +143,8 @@ const std::vector<Line>& Lines() {
         {"vswitch standard portgroup policy failover set -p Lab -u", 0, ""},
         {"vswitch standard portgroup policy security get -p Lab", 0, ""},
         {"vswitch standard portgroup policy security set -p Lab -f false", 0, ""},
-        {"ip interface add -p Lab -i tkn7", 1,
-         "Unable to add Tarkon network interface. Error was : Adding interfaces "},
-        {"ip interface remove -i tkn7", 1, "Unable to find Tarkon network interface with the name tkn7"},
+        {"ip interface add -p Lab -i tkn7", 0, ""},
+        {"ip interface remove -i tkn7", 0, ""},
         {"vswitch standard portgroup remove -p Lab -v vSwitch0", 0, ""},
         {"vswitch standard remove -v vSwitch9", 0, ""},
         {"vswitch dvs talvex list", 0, ""},
@@ -187,6 +186,30 @@ const std::vector<Line>& Lines() {
         {"ens lcore affinity set -l 1 -a 0", 1, "ENS contexts are not available on a Linux host"},
     };
     return lines;
+}
+
+// The lines of one text that the other lacks, marked - and +.
+std::string Difference(const std::string& before, const std::string& after) {
+    auto lines = [](const std::string& text) {
+        std::multiset<std::string> out;
+        std::size_t start = 0;
+        while (start < text.size()) {
+            std::size_t end = text.find('\n', start);
+            if (end == std::string::npos) end = text.size();
+            out.insert(text.substr(start, end - start));
+            start = end + 1;
+        }
+        return out;
+    };
+    auto a = lines(before), b = lines(after);
+    std::string out;
+    for (const auto& line : a) {
+        if (a.count(line) > b.count(line)) out += "- " + line + "\n";
+    }
+    for (const auto& line : b) {
+        if (b.count(line) > a.count(line)) out += "+ " + line + "\n";
+    }
+    return out;
 }
 
 class LinuxSweepTest : public Hadro::Test::NamespaceHostTest {
@@ -264,7 +287,9 @@ TEST_F(LinuxSweepTest, EveryCommandWorksOrGivesItsRefusalAndARefusalChangesNothi
         if (line.status == 0) continue;
         EXPECT_EQ(result.err.rfind(line.refusal, 0), 0u) << line.command << "\n" << result.err;
         EXPECT_EQ(result.err.find("unexpected"), std::string::npos) << line.command << "\n" << result.err;
-        EXPECT_EQ(Snapshot(), before) << line.command << " was refused, but the host changed";
+        const std::string after = Snapshot();
+        EXPECT_TRUE(after == before) << line.command << " was refused, but the host changed:\n"
+                                     << Difference(before, after);
     }
 }
 

@@ -21,6 +21,7 @@
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/request.h"
 
 namespace TknCtl::Linux::Kernel {
 
@@ -130,6 +131,7 @@ std::vector<Message> Exchange(const Namespace& ns, Message request, const std::s
 // Sends a change and waits for the kernel's answer.
 void Send(const Namespace& ns, nl_msg* request, const std::string& what) {
     Check(nl_send_sync(RouteSocket(ns), request), what);  // frees the request
+    Changed();  // what was read of the kernel before is read again
 }
 
 Message Dump(int type, int family, std::size_t headerSize) {

@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "hostctl/exception.h"
+#include "kernel/links.h"
 #include "kernel/netlink.h"
 
 namespace TknCtl::Linux::Kernel {
@@ -93,6 +94,15 @@ void AddNamedNamespace(const std::string& name) {
     if (!fault.empty()) {
         unlink(path.c_str());
         throw HostCtlException(fault);
+    }
+    // A netstack reaches itself from the start, as the program's own does: its loopback is up.
+    try {
+        LinkChange up;
+        up.up = true;
+        ChangeLink(Namespace::Named(name), "lo", up);
+    } catch (...) {
+        DeleteNamedNamespace(name);
+        throw;
     }
 }
 

@@ -95,6 +95,7 @@ TEST(Completion, BashCompletesTheTreeOptionsValuesAndHostNames) {
     EXPECT_EQ(Complete("--formatter=k"), "--formatter=keyvalue|");
     // Readline splits words at '=': only the value is replaced.
     EXPECT_EQ(Complete("--formatter = k"), "keyvalue|");
+    EXPECT_EQ(Complete("--backend=''"), "--backend=simulated|--backend=linux|");
     // Options not given yet; values of enumerations and booleans.
     std::string options = Complete("network ip interface set --interface-name tkn0 --");
     EXPECT_EQ(options.find("--interface-name|"), std::string::npos) << options;
@@ -133,6 +134,7 @@ TEST(Completion, ZshCompletesTheSameWay) {
     if (Shell("command -v zsh >/dev/null").status != 0) GTEST_SKIP() << "no zsh";
     EXPECT_EQ(CompleteZsh("''"), "network|");
     EXPECT_EQ(CompleteZsh("--formatter ''"), "simple|table|json|xml|csv|keyvalue|");
+    EXPECT_EQ(CompleteZsh("--backend ''"), "simulated|linux|");
     EXPECT_EQ(CompleteZsh("network ip interface set --interface-name tkn0 --"), "--enabled|--mtu|");
     EXPECT_EQ(CompleteZsh("network ip interface set --enabled ''"), "true|false|");
     EXPECT_EQ(CompleteZsh("network ip interface set -i ''").substr(0, 10), "tkn0|tkn1|");

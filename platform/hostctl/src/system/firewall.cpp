@@ -47,6 +47,32 @@ const FirewallSection& Loaded() {
     return section;
 }
 
+// The allowed addresses of a ruleset, from their texts (addresses and CIDR networks of both
+// families; both hosts refuse other text before it is kept).
+std::unique_ptr<HostCtl::System::FirewallAllowedIps> AllowedIpsOf(const std::vector<std::string>& texts) {
+    using namespace HostCtl::Network;
+    auto out = std::make_unique<HostCtl::System::FirewallAllowedIps>();
+    for (const auto& text : texts) {
+        auto entry = Model::ParseAllowedIp(text);
+        if (!entry) continue;
+        switch (entry->kind) {
+            case Model::AllowedIpKind::kIpv4Address:
+                out->AddIpv4Address(Ipv4Address(entry->text));
+                break;
+            case Model::AllowedIpKind::kIpv4Network:
+                out->AddIpv4Network(Ipv4Network(entry->text));
+                break;
+            case Model::AllowedIpKind::kIpv6Address:
+                out->AddIpv6Address(Ipv6Address(entry->text));
+                break;
+            case Model::AllowedIpKind::kIpv6Network:
+                out->AddIpv6Network(Ipv6Network(entry->text));
+                break;
+        }
+    }
+    return out;
+}
+
 // ---------------------------------------------------------------- a real host
 
 // The real host's firewall as it is now, once the module is known to be loaded.
@@ -148,27 +174,7 @@ public:
     }
 
     std::unique_ptr<HostCtl::System::FirewallAllowedIps> GetAllowedIps() override {
-        using namespace HostCtl::Network;
-        auto out = std::make_unique<HostCtl::System::FirewallAllowedIps>();
-        for (const auto& text : Get("GetAllowedIps").allowedIps) {
-            auto entry = Model::ParseAllowedIp(text);
-            if (!entry) continue;  // the model refuses such text when it is loaded
-            switch (entry->kind) {
-                case Model::AllowedIpKind::kIpv4Address:
-                    out->AddIpv4Address(Ipv4Address(entry->text));
-                    break;
-                case Model::AllowedIpKind::kIpv4Network:
-                    out->AddIpv4Network(Ipv4Network(entry->text));
-                    break;
-                case Model::AllowedIpKind::kIpv6Address:
-                    out->AddIpv6Address(Ipv6Address(entry->text));
-                    break;
-                case Model::AllowedIpKind::kIpv6Network:
-                    out->AddIpv6Network(Ipv6Network(entry->text));
-                    break;
-            }
-        }
-        return out;
+        return AllowedIpsOf(Get("GetAllowedIps").allowedIps);
     }
 
     void AddAllowedIp(const std::string& address) override {
@@ -275,27 +281,7 @@ public:
     }
 
     std::unique_ptr<HostCtl::System::FirewallAllowedIps> GetAllowedIps() override {
-        using namespace HostCtl::Network;
-        auto out = std::make_unique<HostCtl::System::FirewallAllowedIps>();
-        for (const auto& text : Get("GetAllowedIps").allowedIps) {
-            auto entry = Model::ParseAllowedIp(text);
-            if (!entry) continue;
-            switch (entry->kind) {
-                case Model::AllowedIpKind::kIpv4Address:
-                    out->AddIpv4Address(Ipv4Address(entry->text));
-                    break;
-                case Model::AllowedIpKind::kIpv4Network:
-                    out->AddIpv4Network(Ipv4Network(entry->text));
-                    break;
-                case Model::AllowedIpKind::kIpv6Address:
-                    out->AddIpv6Address(Ipv6Address(entry->text));
-                    break;
-                case Model::AllowedIpKind::kIpv6Network:
-                    out->AddIpv6Network(Ipv6Network(entry->text));
-                    break;
-            }
-        }
-        return out;
+        return AllowedIpsOf(Get("GetAllowedIps").allowedIps);
     }
 
     void AddAllowedIp(const std::string& address) override {

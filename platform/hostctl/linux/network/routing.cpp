@@ -159,43 +159,11 @@ public:
     void RequireNetstack(const std::string& netstack) override { context_.NamespaceOf(netstack); }
 
     std::vector<HostIpv4Route> Ipv4Routes(const std::string& netstack) override {
-        std::vector<HostIpv4Route> out;
-        auto& view = views_.Of(netstack);
-        for (const auto& route : view.MainRoutes(AF_INET)) {
-            if (route.type != RTN_UNICAST) continue;
-            Ipv4Network network(Ipv4Address(route.destination), route.prefixLength);
-            for (const auto& hop : route.nexthops) {
-                HostIpv4Route r;
-                r.network = network;
-                if (!hop.gateway.empty()) r.gateway = Ipv4Address(hop.gateway);
-                r.interfaceName = view.NameOf(hop.index);
-                r.source = RouteSource(route.protocol);
-                r.connected = route.protocol == RTPROT_KERNEL;
-                r.metric = route.metric;
-                out.push_back(std::move(r));
-            }
-        }
-        return out;
+        return Routes<HostIpv4Route, Ipv4Network, Ipv4Address>(netstack, AF_INET);
     }
 
     std::vector<HostIpv6Route> Ipv6Routes(const std::string& netstack) override {
-        std::vector<HostIpv6Route> out;
-        auto& view = views_.Of(netstack);
-        for (const auto& route : view.MainRoutes(AF_INET6)) {
-            if (route.type != RTN_UNICAST) continue;
-            Ipv6Network network(Ipv6Address(route.destination), route.prefixLength);
-            for (const auto& hop : route.nexthops) {
-                HostIpv6Route r;
-                r.network = network;
-                if (!hop.gateway.empty()) r.gateway = Ipv6Address(hop.gateway);
-                r.interfaceName = view.NameOf(hop.index);
-                r.source = RouteSource(route.protocol);
-                r.connected = route.protocol == RTPROT_KERNEL;
-                r.metric = route.metric;
-                out.push_back(std::move(r));
-            }
-        }
-        return out;
+        return Routes<HostIpv6Route, Ipv6Network, Ipv6Address>(netstack, AF_INET6);
     }
 
     std::string Ipv4RouteSource(const std::string& netstack, const Ipv4Network& network) override {
@@ -313,6 +281,28 @@ public:
     }
 
 private:
+    // The unicast routes of a netstack's main table: one record per next hop.
+    template <class Route, class Network, class Address>
+    std::vector<Route> Routes(const std::string& netstack, int family) {
+        std::vector<Route> out;
+        auto& view = views_.Of(netstack);
+        for (const auto& route : view.MainRoutes(family)) {
+            if (route.type != RTN_UNICAST) continue;
+            Network network(Address(route.destination), route.prefixLength);
+            for (const auto& hop : route.nexthops) {
+                Route r;
+                r.network = network;
+                if (!hop.gateway.empty()) r.gateway = Address(hop.gateway);
+                r.interfaceName = view.NameOf(hop.index);
+                r.source = RouteSource(route.protocol);
+                r.connected = route.protocol == RTPROT_KERNEL;
+                r.metric = route.metric;
+                out.push_back(std::move(r));
+            }
+        }
+        return out;
+    }
+
     // The index of the IP interface of that name; throws when there is none.
     int IndexOf(NetstackView& view, const std::string& name) {
         const auto* link = view.IpInterface(name);

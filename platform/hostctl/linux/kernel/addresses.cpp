@@ -19,11 +19,6 @@ using HostCtl::Lib::HostCtlException;
 
 namespace {
 
-std::string AttrAddress(int family, nlattr* attr) {
-    if (!attr) return {};
-    return AddressText(family, nla_data(attr), static_cast<std::size_t>(nla_len(attr)));
-}
-
 std::string Describe(const Address& address) {
     return address.address + "/" + std::to_string(address.prefixLength);
 }
@@ -60,10 +55,10 @@ std::optional<Address> ParseAddress(const nlmsghdr* message) {
     nlattr* remote = tb[IFA_ADDRESS];
     bool same = local && remote && nla_len(local) == nla_len(remote) &&
                 std::memcmp(nla_data(local), nla_data(remote), static_cast<std::size_t>(nla_len(local))) == 0;
-    out.address = AttrAddress(out.family, local ? local : remote);
-    if (local && remote && !same) out.peer = AttrAddress(out.family, remote);
+    out.address = AttributeAddress(out.family, local ? local : remote);
+    if (local && remote && !same) out.peer = AttributeAddress(out.family, remote);
     if (out.address.empty()) return std::nullopt;
-    out.broadcast = AttrAddress(out.family, tb[IFA_BROADCAST]);
+    out.broadcast = AttributeAddress(out.family, tb[IFA_BROADCAST]);
     if (tb[IFA_LABEL]) out.label = nla_get_string(tb[IFA_LABEL]);
     if (tb[IFA_PROTO]) out.protocol = nla_get_u8(tb[IFA_PROTO]);
     if (tb[IFA_CACHEINFO] && nla_len(tb[IFA_CACHEINFO]) >= static_cast<int>(sizeof(ifa_cacheinfo))) {

@@ -56,8 +56,7 @@ std::optional<Neighbour> ParseNeighbour(const nlmsghdr* message) {
     out.index = info->ndm_ifindex;
     out.state = info->ndm_state;
     out.flags = info->ndm_flags;
-    out.address =
-        AddressText(out.family, nla_data(tb[NDA_DST]), static_cast<std::size_t>(nla_len(tb[NDA_DST])));
+    out.address = AttributeAddress(out.family, tb[NDA_DST]);
     if (out.address.empty()) return std::nullopt;
     out.linkLayer = LinkLayerText(tb[NDA_LLADDR]);
     if (tb[NDA_CACHEINFO] && nla_len(tb[NDA_CACHEINFO]) >= static_cast<int>(sizeof(nda_cacheinfo))) {

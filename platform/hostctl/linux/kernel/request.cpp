@@ -246,6 +246,11 @@ std::string AddressText(int family, const void* bytes, std::size_t length) {
     return text;
 }
 
+std::string AttributeAddress(int family, const nlattr* attr) {
+    if (!attr) return {};
+    return AddressText(family, nla_data(attr), static_cast<std::size_t>(nla_len(attr)));
+}
+
 bool AddressBytes(int family, const std::string& text, unsigned char bytes[16]) {
     std::memset(bytes, 0, 16);
     return (family == AF_INET || family == AF_INET6) && inet_pton(family, text.c_str(), bytes) == 1;

@@ -18,6 +18,8 @@
 struct nl_msg;
 struct nlmsghdr;
 
+struct nlattr;
+
 namespace TknCtl::Linux::Kernel {
 
 // The kernel's answer to a request: 0 or a negative error number, and the reason it gave.
@@ -54,6 +56,8 @@ void Changed();
 // An address as text (inet_ntop): family AF_INET (4 bytes) or AF_INET6 (16 bytes); empty for
 // another family or length.
 std::string AddressText(int family, const void* bytes, std::size_t length);
+// The address an attribute holds, as text; empty for no attribute.
+std::string AttributeAddress(int family, const nlattr* attr);
 // The bytes of an address given as text; false when the text is no address of the family.
 bool AddressBytes(int family, const std::string& text, unsigned char bytes[16]);
 

@@ -17,11 +17,6 @@ using HostCtl::Lib::HostCtlException;
 
 namespace {
 
-std::string AttrAddress(int family, nlattr* attr) {
-    if (!attr) return {};
-    return AddressText(family, nla_data(attr), static_cast<std::size_t>(nla_len(attr)));
-}
-
 // The next hops of RTA_MULTIPATH: a list of rtnexthop, each followed by its attributes.
 void ParseMultipath(int family, nlattr* multipath, std::vector<Nexthop>& out) {
     const char* data = static_cast<const char*>(nla_data(multipath));
@@ -36,7 +31,7 @@ void ParseMultipath(int family, nlattr* multipath, std::vector<Nexthop>& out) {
             nlattr* tb[RTA_MAX + 1] = {};
             auto* attrs = reinterpret_cast<nlattr*>(const_cast<char*>(data) + RTNH_LENGTH(0));
             if (nla_parse(tb, RTA_MAX, attrs, attrLength, nullptr) == 0)
-                next.gateway = AttrAddress(family, tb[RTA_GATEWAY]);
+                next.gateway = AttributeAddress(family, tb[RTA_GATEWAY]);
         }
         out.push_back(std::move(next));
         int step = static_cast<int>(RTNH_ALIGN(hop->rtnh_len));
@@ -71,15 +66,15 @@ std::optional<Route> ParseRoute(const nlmsghdr* message) {
     out.protocol = info->rtm_protocol;
     out.type = info->rtm_type;
     out.scope = info->rtm_scope;
-    out.destination = AttrAddress(out.family, tb[RTA_DST]);
+    out.destination = AttributeAddress(out.family, tb[RTA_DST]);
     if (out.destination.empty()) out.destination = out.family == AF_INET ? "0.0.0.0" : "::";
     if (tb[RTA_PRIORITY]) out.metric = nla_get_u32(tb[RTA_PRIORITY]);
-    out.preferredSource = AttrAddress(out.family, tb[RTA_PREFSRC]);
+    out.preferredSource = AttributeAddress(out.family, tb[RTA_PREFSRC]);
     if (tb[RTA_MULTIPATH]) {
         ParseMultipath(out.family, tb[RTA_MULTIPATH], out.nexthops);
     } else {
         Nexthop hop;
-        hop.gateway = AttrAddress(out.family, tb[RTA_GATEWAY]);
+        hop.gateway = AttributeAddress(out.family, tb[RTA_GATEWAY]);
         if (tb[RTA_OIF]) hop.index = static_cast<int>(nla_get_u32(tb[RTA_OIF]));
         if (hop.index != 0 || !hop.gateway.empty()) out.nexthops.push_back(std::move(hop));
     }

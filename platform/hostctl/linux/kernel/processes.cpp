@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <limits.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -86,6 +87,35 @@ std::map<std::uint64_t, Process> SocketOwners(const std::set<std::uint64_t>& ino
         if (owners.size() == inodes.size()) break;
     }
     return owners;
+}
+
+std::map<std::string, Process> FileHolders(const std::set<std::string>& paths, const std::string& procRoot) {
+    std::map<std::string, Process> holders;
+    if (paths.empty()) return holders;
+    for (std::uint32_t pid : Pids(procRoot)) {
+        std::string fds = procRoot + "/" + std::to_string(pid) + "/fd";
+        DIR* dir = opendir(fds.c_str());
+        if (!dir) continue;  // gone, or not ours to read
+        bool found = false;
+        while (const dirent* entry = readdir(dir)) {
+            if (entry->d_name[0] == '.') continue;
+            char target[PATH_MAX];
+            ssize_t n = readlinkat(dirfd(dir), entry->d_name, target, sizeof(target));
+            if (n <= 0 || static_cast<std::size_t>(n) >= sizeof(target)) continue;
+            std::string path(target, static_cast<std::size_t>(n));
+            if (!paths.count(path) || holders.count(path)) continue;
+            holders[path].pid = pid;
+            found = true;
+        }
+        closedir(dir);
+        if (!found) continue;
+        std::string name = ProcessName(pid, procRoot).value_or(std::string());
+        for (auto& [path, holder] : holders) {
+            if (holder.pid == pid) holder.name = name;
+        }
+        if (holders.size() == paths.size()) break;
+    }
+    return holders;
 }
 
 }  // namespace TknCtl::Linux::Kernel

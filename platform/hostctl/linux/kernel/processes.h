@@ -1,5 +1,6 @@
 // Processes as /proc shows them: their names, and which of them hold a socket open (the owners
-// that `ss -p` shows). A process whose descriptors the program may not read is not seen.
+// that `ss -p` shows) or a device file (the process a device is handed to). A process whose
+// descriptors the program may not read is not seen.
 #pragma once
 
 #include <cstdint>
@@ -28,5 +29,11 @@ std::optional<std::string> ProcessName(std::uint32_t pid, const std::string& pro
 // the search ends once every inode has its owner.
 std::map<std::uint64_t, Process> SocketOwners(const std::set<std::uint64_t>& inodes,
                                               const std::string& procRoot = "/proc");
+
+// The holders of files: each path of the set that an open descriptor of a process points to
+// (as /proc/PID/fd shows it), with the process of the lowest PID that holds it. Processes are
+// looked at in PID order and the search ends once every path has its holder.
+std::map<std::string, Process> FileHolders(const std::set<std::string>& paths,
+                                           const std::string& procRoot = "/proc");
 
 }  // namespace TknCtl::Linux::Kernel

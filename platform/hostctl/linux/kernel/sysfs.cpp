@@ -6,9 +6,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cctype>
+#include <charconv>
 #include <fstream>
 #include <istream>
+#include <vector>
 
 namespace TknCtl::Linux::Kernel {
 
@@ -62,6 +65,39 @@ std::string Lower(std::string text) {
     for (auto& c : text)
         c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
     return text;
+}
+
+// The last component of what a symbolic link points to (a driver's name, an IOMMU group's
+// number); empty when there is no such link.
+std::string LinkName(const std::string& path) {
+    char target[PATH_MAX];
+    const ssize_t length = readlink(path.c_str(), target, sizeof(target));
+    if (length <= 0 || static_cast<std::size_t>(length) >= sizeof(target)) return {};
+    return Basename(std::string(target, static_cast<std::size_t>(length)));
+}
+
+// The names of a directory's entries (without "." and ".."), in name order; none when it
+// cannot be read.
+std::vector<std::string> Entries(const std::string& path) {
+    std::vector<std::string> names;
+    if (DIR* dir = opendir(path.c_str())) {
+        while (const dirent* entry = readdir(dir)) {
+            const std::string name = entry->d_name;
+            if (name != "." && name != "..") names.push_back(name);
+        }
+        closedir(dir);
+    }
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+// The decimal number that is the whole text, or nothing.
+std::optional<std::uint32_t> Number(const std::string& text) {
+    std::uint32_t value = 0;
+    if (text.empty()) return std::nullopt;
+    auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error != std::errc() || end != text.data() + text.size()) return std::nullopt;
+    return value;
 }
 
 }  // namespace
@@ -149,6 +185,42 @@ std::pair<std::uint32_t, std::uint32_t> QueueCounts(const std::string& root, con
     }
     closedir(dir);
     return counts;
+}
+
+std::optional<SriovFunction> ReadSriov(const std::string& root, const std::string& interface) {
+    if (!HasNetDevice(root, interface)) return std::nullopt;
+    const std::string device = root + "/class/net/" + interface + "/device";
+    const auto total = Number(ReadLine(device + "/sriov_totalvfs"));
+    if (!total) return std::nullopt;
+    SriovFunction out;
+    out.totalVfs = *total;
+    out.numVfs = Number(ReadLine(device + "/sriov_numvfs")).value_or(0);
+    for (const auto& entry : Entries(device)) {
+        if (entry.rfind("virtfn", 0) != 0) continue;
+        const auto number = Number(entry.substr(6));
+        const std::string vf = device + "/" + entry;
+        const std::string function = Basename(RealPath(vf));
+        if (!number || function.empty()) continue;  // not a VF's link, or one that leads nowhere
+        VirtualFunction v;
+        v.number = *number;
+        v.pciAddress = function;
+        v.driver = LinkName(vf + "/driver");
+        v.interfaces = Entries(vf + "/net");
+        v.iommuGroup = LinkName(vf + "/iommu_group");
+        for (const auto& name : Entries(vf + "/vfio-dev"))
+            v.userDevices.push_back("vfio/devices/" + name);
+        for (const auto& name : Entries(vf + "/uio"))
+            v.userDevices.push_back(name);
+        out.vfs.push_back(std::move(v));
+    }
+    std::sort(out.vfs.begin(), out.vfs.end(),
+              [](const VirtualFunction& a, const VirtualFunction& b) { return a.number < b.number; });
+    return out;
+}
+
+std::string PhysicalPortName(const std::string& root, const std::string& interface) {
+    if (!SafeName(interface)) return {};
+    return ReadLine(root + "/class/net/" + interface + "/phys_port_name");
 }
 
 std::optional<bool> BridgeVlanStatsEnabled(const std::string& root, const std::string& bridge) {

@@ -1,6 +1,7 @@
 // What sysfs says of network devices: the hardware behind an interface (a PCI function, a USB
-// adapter, ...), its queues, and the options of bridges. Every function takes the root of
-// sysfs ("/sys" on a host) so that tests give it a tree of their own.
+// adapter, ...), its queues, the virtual functions of an SR-IOV device, and the options of
+// bridges. Every function takes the root of sysfs ("/sys" on a host) so that tests give it a
+// tree of their own.
 #pragma once
 
 #include <cstdint>
@@ -8,6 +9,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
 
 namespace TknCtl::Linux::Kernel {
 
@@ -44,6 +46,35 @@ std::pair<std::string, std::string> LookupPciNames(const std::string& vendorId, 
 
 // The RX and TX queues the interface uses now (its queues/rx-N and queues/tx-N entries).
 std::pair<std::uint32_t, std::uint32_t> QueueCounts(const std::string& root, const std::string& interface);
+
+// A virtual function of an SR-IOV device: the device's virtfnN link.
+struct VirtualFunction {
+    std::uint32_t number = 0;  // N of virtfnN: the VF's number in rtnetlink's VF attributes
+    std::string pciAddress;    // its own PCI function ("0000:3b:02.0")
+    std::string driver;        // the driver bound to it ("iavf", "vfio-pci"); empty: none
+    // Its network interfaces, as far as this sysfs shows them: those of the namespace that
+    // mounted it (an interface moved to another namespace is not seen).
+    std::vector<std::string> interfaces;
+    std::string iommuGroup;  // the number of its IOMMU group; empty without an IOMMU
+    // The device files through which user space drives it, below /dev: its VFIO device
+    // ("vfio/devices/vfio3", from vfio-dev/) and its UIO devices ("uio0", from uio/).
+    std::vector<std::string> userDevices;
+};
+
+// The SR-IOV capability of a PCI device (a physical function).
+struct SriovFunction {
+    std::uint32_t totalVfs = 0;        // sriov_totalvfs: the most VFs the device (and its driver) offer
+    std::uint32_t numVfs = 0;          // sriov_numvfs: the VFs enabled now
+    std::vector<VirtualFunction> vfs;  // the virtfnN links, by number
+};
+
+// The SR-IOV capability of the device behind an interface; nothing when the device has none
+// (no sriov_totalvfs, or one that is no number) or the interface has no device.
+std::optional<SriovFunction> ReadSriov(const std::string& root, const std::string& interface);
+
+// The name the driver gives the interface's port (phys_port_name: "p0", "pf0vf3"); empty when
+// it gives none.
+std::string PhysicalPortName(const std::string& root, const std::string& interface);
 
 // Whether a bridge counts traffic per VLAN (its vlan_stats_enabled option); nothing when the
 // kernel has no bridge VLAN filtering, and so no such counters.

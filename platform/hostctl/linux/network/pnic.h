@@ -6,7 +6,7 @@
 //
 // The area's methods are defined in the files named as their twins on the simulated host:
 // network/pnic.cpp (identity, link, general settings), pnic_tunables.cpp, pnic_diag.cpp,
-// pnic_netqueue.cpp and vlan_stats.cpp.
+// pnic_netqueue.cpp, sriov.cpp and vlan_stats.cpp.
 #pragma once
 
 #include <memory>
@@ -71,6 +71,12 @@ public:
 
     void GetNetqueueInfo(const std::string& name, HostCtl::Network::PnicNetqueueInfo& info) override;
     void SetNetqueueInfo(const std::string& name, const HostCtl::Network::PnicNetqueueInfo& info) override;
+
+    std::vector<std::string> ListSriovNics() override;
+    bool IsSriovNic(const std::string& name) override;
+    std::vector<HostCtl::Network::SriovNicVFInfo> GetSriovNicVFInfo(const std::string& name) override;
+    void GetSriovNicVFStats(const std::string& name, std::uint8_t vfId,
+                            HostCtl::Network::SriovNicVFStats& stats) override;
 
     std::vector<HostCtl::Network::VlanStats> GetUplinkVlanStats(const std::string& switchName,
                                                                 const std::string& uplink) override;

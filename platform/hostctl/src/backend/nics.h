@@ -1,8 +1,8 @@
 // Physical NICs of a real host.
 //
 // The adapter operations (TknCtl::Network::PnicImpl, NetworkInfoImpl::GetPnics and
-// GetPnicByName, the VLAN counters of switch uplinks) hand their work to this area when the
-// session manages a real host:
+// GetPnicByName, the SR-IOV operations, the VLAN counters of switch uplinks) hand their work
+// to this area when the session manages a real host:
 //
 //     void PnicImpl::GetRingParams(Net::PnicRingParams& params) const {
 //         if (auto* nics = Backend::EnterRealNics("HostCtl::Network::Pnic::GetRingParams", name_))
@@ -100,6 +100,17 @@ public:
     // Netqueue.
     virtual void GetNetqueueInfo(const std::string& name, HostCtl::Network::PnicNetqueueInfo& info) = 0;
     virtual void SetNetqueueInfo(const std::string& name, const HostCtl::Network::PnicNetqueueInfo& info) = 0;
+
+    // SR-IOV: the NICs that are SR-IOV physical functions, in the host's order; whether a NIC is
+    // one (never throws for a name the host lacks); the virtual functions of one, by VF ID; the
+    // counters of one VF. A NIC that is no SR-IOV physical function is refused with
+    // HostCtlException("NAME is not an SR-IOV enabled NIC"), a VF it lacks with
+    // HostCtlException("NAME has no VF ID").
+    virtual std::vector<std::string> ListSriovNics() = 0;
+    virtual bool IsSriovNic(const std::string& name) = 0;
+    virtual std::vector<HostCtl::Network::SriovNicVFInfo> GetSriovNicVFInfo(const std::string& name) = 0;
+    virtual void GetSriovNicVFStats(const std::string& name, std::uint8_t vfId,
+                                    HostCtl::Network::SriovNicVFStats& stats) = 0;
 
     // Per-VLAN counters of a switch's uplink; empty while their collection is off. Refused when
     // the switch has no such uplink.

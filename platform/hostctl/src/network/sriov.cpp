@@ -1,4 +1,5 @@
 // SR-IOV physical functions and their virtual functions.
+#include "backend/nics.h"
 #include "core/hook.h"
 #include "core/section.h"
 #include "hostctl/exception.h"
@@ -22,8 +23,13 @@ const Model::Pnic& SriovPnic(const std::string& name) {
 }  // namespace
 
 std::vector<std::unique_ptr<HostCtl::Network::Pnic>> NetworkInfoImpl::GetSriovNics() {
-    Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetSriovNics");
     std::vector<std::unique_ptr<HostCtl::Network::Pnic>> nics;
+    if (auto* real = Backend::EnterRealNics("TknCtl::Network::NetworkInfoImpl::GetSriovNics")) {
+        for (auto& name : real->ListSriovNics())
+            nics.push_back(std::make_unique<PnicImpl>(std::move(name)));
+        return nics;
+    }
+    Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetSriovNics");
     for (const auto& nic : Lib::Read<Model::PnicsSection>().nics) {
         if (nic.sriov.enabled) nics.push_back(std::make_unique<PnicImpl>(nic.name));
     }
@@ -31,6 +37,8 @@ std::vector<std::unique_ptr<HostCtl::Network::Pnic>> NetworkInfoImpl::GetSriovNi
 }
 
 std::unique_ptr<HostCtl::Network::Pnic> NetworkInfoImpl::GetSriovNicByName(const std::string& name) {
+    if (auto* real = Backend::EnterRealNics("TknCtl::Network::NetworkInfoImpl::GetSriovNicByName", name))
+        return real->IsSriovNic(name) ? std::make_unique<PnicImpl>(name) : nullptr;
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetSriovNicByName", name);
     const auto* nic = Lib::Read<Model::PnicsSection>().Find(name);
     if (!nic || !nic->sriov.enabled) return nullptr;
@@ -38,6 +46,8 @@ std::unique_ptr<HostCtl::Network::Pnic> NetworkInfoImpl::GetSriovNicByName(const
 }
 
 std::vector<HostCtl::Network::SriovNicVFInfo> NetworkInfoImpl::GetSriovNicVFInfo(const std::string& name) {
+    if (auto* real = Backend::EnterRealNics("TknCtl::Network::NetworkInfoImpl::GetSriovNicVFInfo", name))
+        return real->GetSriovNicVFInfo(name);
     Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetSriovNicVFInfo", name);
     std::vector<HostCtl::Network::SriovNicVFInfo> vfs;
     for (const auto& vf : SriovPnic(name).sriov.vfs) {
@@ -53,8 +63,10 @@ std::vector<HostCtl::Network::SriovNicVFInfo> NetworkInfoImpl::GetSriovNicVFInfo
 
 void NetworkInfoImpl::GetSriovNicVFStats(HostCtl::Network::SriovNicVFStats* stats, const std::string& name,
                                          std::uint8_t vfId) {
-    Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetSriovNicVFStats", name, Lib::Args(vfId));
+    auto* real = Backend::EnterRealNics("TknCtl::Network::NetworkInfoImpl::GetSriovNicVFStats", name);
+    if (!real) Lib::Enter("TknCtl::Network::NetworkInfoImpl::GetSriovNicVFStats", name, Lib::Args(vfId));
     if (!stats) throw HostCtlException("No record given for the statistics of VF " + std::to_string(vfId));
+    if (real) return real->GetSriovNicVFStats(name, vfId, *stats);
     const auto& nic = SriovPnic(name);
     for (const auto& vf : nic.sriov.vfs) {
         if (vf.id != vfId) continue;

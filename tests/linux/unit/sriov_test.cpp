@@ -2,7 +2,6 @@
 // with VF information built in memory, the holders of device files in a /proc tree of the
 // test's own, and what the NIC area makes of them (which VF is in use, and by whom; counters).
 #include <arpa/inet.h>
-#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <linux/if_link.h>
 #include <linux/rtnetlink.h>
@@ -46,49 +45,52 @@ protected:
     std::string root_;
 };
 
+// A VF as one line: number, PCI function, driver, IOMMU group, interfaces, device files.
+std::string Line(const K::VirtualFunction& vf) {
+    std::string line =
+        std::to_string(vf.number) + " " + vf.pciAddress + " " + vf.driver + " " + vf.iommuGroup;
+    for (const auto& name : vf.interfaces)
+        line += " if:" + name;
+    for (const auto& name : vf.userDevices)
+        line += " dev:" + name;
+    return line;
+}
+
 TEST_F(SriovTreeTest, ReadsThePhysicalFunctionAndItsVirtualFunctions) {
     const std::string pf = "devices/pci0000:3a/0000:3b:00.0";
-    auto vf = [&](const std::string& address) { return root_ + "/devices/pci0000:3a/" + address; };
     fs::create_directories(root_ + "/" + pf + "/net/pf0");
     Link(root_ + "/" + pf, pf + "/net/pf0/device");
     Link(root_ + "/" + pf + "/net/pf0", "class/net/pf0");
     Write(pf + "/sriov_totalvfs", "64\n");
     Write(pf + "/sriov_numvfs", "12\n");
+    auto vf = [&](int number, const std::string& address, const std::string& driver) {
+        const std::string dir = "devices/pci0000:3a/" + address;
+        fs::create_directories(root_ + "/" + dir);
+        Link(root_ + "/" + dir, pf + "/virtfn" + std::to_string(number));
+        if (!driver.empty()) Link("../../../bus/pci/drivers/" + driver, dir + "/driver");
+        return root_ + "/" + dir;
+    };
     // VF 0 handed to VFIO, VF 2 driven by the kernel, VF 10 without a driver (after VF 2: by
     // number, not by name), and links that are no VFs.
-    Link(vf("0000:3b:02.0"), pf + "/virtfn0");
-    Link(root_ + "/bus/pci/drivers/vfio-pci", "devices/pci0000:3a/0000:3b:02.0/driver");
-    Link(root_ + "/kernel/iommu_groups/77", "devices/pci0000:3a/0000:3b:02.0/iommu_group");
-    fs::create_directories(vf("0000:3b:02.0") + "/vfio-dev/vfio3");
-    Link(vf("0000:3b:02.2"), pf + "/virtfn2");
-    Link(root_ + "/bus/pci/drivers/iavf", "devices/pci0000:3a/0000:3b:02.2/driver");
-    fs::create_directories(vf("0000:3b:02.2") + "/net/enp59s2f2");
-    fs::create_directories(vf("0000:3b:02.2") + "/uio/uio1");
-    Link(vf("0000:3b:03.2"), pf + "/virtfn10");
-    fs::create_directories(vf("0000:3b:03.2"));
-    Link(vf("0000:3b:09.0"), pf + "/virtfn11");  // leads nowhere
-    Link(vf("0000:3b:02.0"), pf + "/virtfnx");
+    Link("../../../kernel/iommu_groups/77", "devices/pci0000:3a/0000:3b:02.0/iommu_group");
+    fs::create_directories(vf(0, "0000:3b:02.0", "vfio-pci") + "/vfio-dev/vfio3");
+    const std::string kernel = vf(2, "0000:3b:02.2", "iavf");
+    fs::create_directories(kernel + "/net/enp59s2f2");
+    fs::create_directories(kernel + "/uio/uio1");
+    vf(10, "0000:3b:03.2", "");
+    Link(root_ + "/devices/pci0000:3a/0000:3b:09.0", pf + "/virtfn11");  // leads nowhere
+    Link(root_ + "/devices/pci0000:3a/0000:3b:02.0", pf + "/virtfnx");
 
     auto sriov = K::ReadSriov(root_, "pf0");
     ASSERT_TRUE(sriov);
     EXPECT_EQ(sriov->totalVfs, 64u);
     EXPECT_EQ(sriov->numVfs, 12u);
-    ASSERT_EQ(sriov->vfs.size(), 3u);
-    const auto& v0 = sriov->vfs[0];
-    EXPECT_EQ(v0.number, 0u);
-    EXPECT_EQ(v0.pciAddress, "0000:3b:02.0");
-    EXPECT_EQ(v0.driver, "vfio-pci");
-    EXPECT_EQ(v0.iommuGroup, "77");
-    EXPECT_EQ(v0.userDevices, std::vector<std::string>{"vfio/devices/vfio3"});
-    EXPECT_TRUE(v0.interfaces.empty());
-    EXPECT_EQ(sriov->vfs[1].number, 2u);
-    EXPECT_EQ(sriov->vfs[1].driver, "iavf");
-    EXPECT_EQ(sriov->vfs[1].interfaces, std::vector<std::string>{"enp59s2f2"});
-    EXPECT_EQ(sriov->vfs[1].userDevices, std::vector<std::string>{"uio1"});
-    EXPECT_EQ(sriov->vfs[2].number, 10u);
-    EXPECT_EQ(sriov->vfs[2].driver, "");
-    EXPECT_EQ(sriov->vfs[2].iommuGroup, "");
-
+    std::vector<std::string> lines;
+    for (const auto& each : sriov->vfs)
+        lines.push_back(Line(each));
+    EXPECT_EQ(lines,
+              (std::vector<std::string>{"0 0000:3b:02.0 vfio-pci 77 dev:vfio/devices/vfio3",
+                                        "2 0000:3b:02.2 iavf  if:enp59s2f2 dev:uio1", "10 0000:3b:03.2  "}));
     EXPECT_EQ(K::PhysicalPortName(root_, "pf0"), "");
     Write(pf + "/net/pf0/phys_port_name", "p0\n");
     EXPECT_EQ(K::PhysicalPortName(root_, "pf0"), "p0");
@@ -121,18 +123,33 @@ TEST_F(SriovTreeTest, FindsTheLowestProcessThatHoldsAFile) {
     EXPECT_EQ(holders["/dev/vfio/77"].name, "proc41");
     EXPECT_EQ(holders["/dev/uio1"].pid, 41u);
     EXPECT_TRUE(K::FileHolders({}, root_).empty());
-
-    // This process, in the real /proc.
-    const std::string file = root_ + "/held";
-    Write("held", "");
-    const int held = open(file.c_str(), O_RDONLY | O_CLOEXEC);
-    ASSERT_GE(held, 0);
-    auto real = K::FileHolders({file});
-    close(held);
-    EXPECT_EQ(real[file].pid, static_cast<std::uint32_t>(getpid()));
 }
 
 // ---------------------------------------------------------------- rtnetlink
+
+std::string Line(const K::VfConfig& vf) {
+    char vlan[64];
+    std::string line = std::to_string(vf.number) + " " + vf.mac;
+    for (const auto& each : vf.vlans) {
+        snprintf(vlan, sizeof(vlan), " vlan:%u/%u/%x", each.id, each.qos, each.protocol);
+        line += vlan;
+    }
+    auto setting = [](std::optional<bool> value) {
+        return value ? std::to_string(*value) : std::string("-");
+    };
+    line += " spoof:" + setting(vf.spoofCheck) + " trust:" + setting(vf.trust) +
+            " state:" + std::to_string(static_cast<int>(vf.linkState)) +
+            " rate:" + std::to_string(vf.minRate) + "-" + std::to_string(vf.maxRate);
+    if (const auto& c = vf.counters) {
+        const char* separator = " counters:";
+        for (auto n : {c->rxPackets, c->txPackets, c->rxBytes, c->txBytes, c->broadcast, c->multicast,
+                       c->rxDropped, c->txDropped}) {
+            line += separator + std::to_string(n);
+            separator = ",";
+        }
+    }
+    return line;
+}
 
 template <class T>
 void Put(nl_msg* message, int type, const T& value) {
@@ -196,32 +213,14 @@ TEST(VfMessages, ReadsEachVfsSettingsAndCounters) {
     EXPECT_EQ(parsed->name, "pf0");
     EXPECT_EQ(parsed->numVfs, 3u);
     EXPECT_TRUE(parsed->reported);
-    ASSERT_EQ(parsed->vfs.size(), 2u);
-    const auto& v0 = parsed->vfs[0];
-    EXPECT_EQ(v0.number, 0u);
-    EXPECT_EQ(v0.mac, "02:ab:00:00:00:10");
-    ASSERT_EQ(v0.vlans.size(), 1u);  // the list wins over the single VLAN
-    EXPECT_EQ(v0.vlans[0].id, 200u);
-    EXPECT_EQ(v0.vlans[0].qos, 5u);
-    EXPECT_EQ(v0.vlans[0].protocol, 0x88a8);
-    EXPECT_EQ(v0.spoofCheck, true);
-    EXPECT_EQ(v0.trust, false);
-    EXPECT_EQ(v0.linkState, K::VfLinkState::kDisable);
-    EXPECT_EQ(v0.minRate, 100u);
-    EXPECT_EQ(v0.maxRate, 1000u);
-    ASSERT_TRUE(v0.counters);
-    EXPECT_EQ(v0.counters->rxPackets, 1000u);
-    EXPECT_EQ(v0.counters->rxBytes, 1ULL << 40);
-    EXPECT_EQ(v0.counters->txDropped, 4u);
-    EXPECT_EQ(v0.counters->txPackets, 0u);
-    const auto& v1 = parsed->vfs[1];
-    EXPECT_EQ(v1.mac, "00:00:00:00:00:00");
-    EXPECT_TRUE(v1.vlans.empty());
-    EXPECT_FALSE(v1.spoofCheck);
-    EXPECT_FALSE(v1.trust);
-    EXPECT_EQ(v1.linkState, K::VfLinkState::kEnable);
-    EXPECT_EQ(v1.maxRate, 500u);
-    EXPECT_FALSE(v1.counters);
+    std::vector<std::string> lines;
+    for (const auto& each : parsed->vfs)
+        lines.push_back(Line(each));
+    // The VLAN list wins over the single VLAN; -1 is a setting left unsaid.
+    EXPECT_EQ(lines, (std::vector<std::string>{
+                         "0 02:ab:00:00:00:10 vlan:200/5/88a8 spoof:1 trust:0 state:2 rate:100-1000 "
+                         "counters:1000,0,1099511627776,0,20,30,0,4",
+                         "1 00:00:00:00:00:00 spoof:- trust:- state:1 rate:0-500"}));
 }
 
 TEST(VfMessages, LinksWithoutVfsRequestsAndOtherMessages) {
@@ -273,8 +272,8 @@ TEST(VfUse, WhoHoldsAVfAndWhetherItIsInUse) {
     EXPECT_TRUE(L::VfDeviceFiles(host).empty());
 
     const std::map<std::string, K::Process> none;
-    const std::map<std::string, K::Process> held{{"/dev/vfio/devices/vfio3", {900, "qemu"}},
-                                                 {"/dev/vfio/77", {812, "qemu"}}};
+    const std::map<std::string, K::Process> held{{"/dev/vfio/devices/vfio3", {900, "vm"}},
+                                                 {"/dev/vfio/77", {812, "vm"}}};
     auto use = [](const K::VirtualFunction& vf, std::optional<K::VfLinkState> state,
                   const std::map<std::string, K::Process>& holders, const std::map<std::string, bool>& up) {
         auto u = L::DecideVfUse(vf, state, holders, up);
@@ -297,27 +296,15 @@ TEST(VfUse, WhoHoldsAVfAndWhetherItIsInUse) {
 }
 
 TEST(VfUse, CountersAsTheLibrarysRecord) {
-    K::VfCounters c;
-    c.rxPackets = 100;
-    c.multicast = 30;
-    c.broadcast = 20;
-    c.rxBytes = 6400;
-    c.txPackets = 7;
-    c.txBytes = 700;
-    c.rxDropped = 2;
-    c.txDropped = 1;
+    // rx, tx packets and bytes, broadcast, multicast, rx and tx drops.
+    K::VfCounters c{100, 7, 6400, 700, 20, 30, 2, 1};
     auto s = L::VfStatsOf(c);
-    EXPECT_EQ(s.rxUnicastPkts, 50u);
-    EXPECT_EQ(s.rxMulticastPkts, 30u);
-    EXPECT_EQ(s.rxBroadcastPkts, 20u);
-    EXPECT_EQ(s.rxUnicastBytes, 6400u);
-    EXPECT_EQ(s.rxMulticastBytes, 0u);
-    EXPECT_EQ(s.txUnicastPkts, 7u);
-    EXPECT_EQ(s.txUnicastBytes, 700u);
-    EXPECT_EQ(s.rxOutOfBufferDrops, 2u);
-    EXPECT_EQ(s.txDiscards, 1u);
-    // A driver whose multicast and broadcast exceed what it received (counters read at
-    // different moments) gives no unicast frames rather than a wrapped number.
+    EXPECT_EQ((std::vector<std::uint64_t>{s.rxUnicastPkts, s.rxMulticastPkts, s.rxBroadcastPkts,
+                                          s.rxUnicastBytes, s.rxMulticastBytes, s.txUnicastPkts,
+                                          s.txUnicastBytes, s.rxOutOfBufferDrops, s.txDiscards}),
+              (std::vector<std::uint64_t>{50, 30, 20, 6400, 0, 7, 700, 2, 1}));
+    // Multicast and broadcast above what was received (counters read at different moments)
+    // give no unicast frames rather than a wrapped number.
     c.rxPackets = 40;
     EXPECT_EQ(L::VfStatsOf(c).rxUnicastPkts, 0u);
 }

@@ -47,7 +47,8 @@ NetstackRecords ParseNetstackRecords(const json& member) {
     NetstackRecords records;
     if (member.is_null()) return records;
     if (!member.is_object()) throw std::invalid_argument("not an object");
-    for (const auto& [key, value] : member.items()) {
+    for (const auto& [name, value] : member.items()) {
+        const std::string& key = name;  // a lambda below captures it: clang 14 cannot capture a binding
         auto fault = [&](const std::string& what) {
             return std::invalid_argument(Lib::Quote(key) + ": " + what);
         };

@@ -168,7 +168,8 @@ public:
     const json& Object(const json& value, const std::string& pointer, const std::string& what,
                        std::initializer_list<const char*> known) const {
         if (!value.is_object()) Fail(pointer, what + " is not an object");
-        for (const auto& [key, member] : value.items()) {
+        for (const auto& item : value.items()) {
+            const std::string& key = item.key();
             if (std::none_of(known.begin(), known.end(), [&](const char* k) { return key == k; })) {
                 std::string choices;
                 for (const char* k : known)

@@ -8,7 +8,9 @@ packages=(cmake g++ ninja-build pkg-config libboost1.81-dev nlohmann-json3-dev l
           # the Linux host: netlink, ethtool, xfrm, sock_diag, nftables
           libnl-3-dev libnl-route-3-dev libnl-genl-3-dev libnl-xfrm-3-dev libnl-idiag-3-dev libnftables-dev
           # the tools its tests ask for the kernel's own view
-          iproute2 nftables ethtool util-linux)
+          iproute2 nftables ethtool util-linux
+          # the Ansible collection (ansible/) and its tests
+          ansible-core)
 
 missing=()
 for p in "${packages[@]}"; do

@@ -38,10 +38,14 @@ options:
     description: The netstack the interface is created in; hadrocli's default when not given.
     type: str
   mac_address:
-    description: The MAC address given to the interface when it is created; only warns on an existing one.
+    description:
+      - The MAC address given to the interface when it is created; on an existing one, a
+        different value only warns.
     type: str
   num_rxqueue:
-    description: The number of receive dispatch queues given when the interface is created; only warns on an existing one.
+    description:
+      - The number of receive dispatch queues given when the interface is created; on an
+        existing one, a different value only warns.
     type: int
   mtu:
     description: The MTU of the interface.

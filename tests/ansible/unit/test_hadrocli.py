@@ -5,7 +5,8 @@ import os
 import unittest
 
 from support import Scratch, ScratchHost, needs_programs, run_module
-from ansible_collections.hadro.network.plugins.modules import dns, facts, portgroup, route, vswitch
+from ansible_collections.hadro.network.plugins.modules import (
+    dns, facts, firewall_ruleset, ip_interface, nic, portgroup, route, vswitch)
 
 
 @needs_programs
@@ -18,6 +19,33 @@ class ChangesTest(ScratchHost):
         self.assertIn({'Name': name, 'Virtual Switch': 'vSwitch1', 'Active Clients': 0, 'VLAN ID': 7},
                       self.hadrocli('network', 'vswitch', 'standard', 'portgroup', 'list'))
         self.assertFalse(run_module(portgroup, args).result['changed'])
+
+    def test_a_second_run_finds_what_the_first_one_set(self):
+        # The host's own forms (netmasks, compressed addresses, cases, orders) read back equal.
+        cases = [
+            (vswitch, dict(name='vSwitch1', cdp_status='both', uplinks=['vmnic4', 'vmnic2'])),
+            (portgroup, dict(name='VM Network', vlan_id=12)),
+            (ip_interface, dict(name='tkn1', enabled=False, ipv4={'address': '198.51.100.22'},
+                                ipv6={'enabled': True, 'addresses': ['2001:DB8:20::5/64']})),
+            (route, dict(network='0.0.0.0/0', gateway='192.0.2.254')),
+            (route, dict(network='2001:DB8:99::/48', gateway='2001:db8:10::1')),
+            (ip_interface, dict(name='tkn0', ipv6={'enabled': False}, tags=['Storage', 'Management'])),
+            (dns, dict(servers=['2001:DB8:10::53', '192.0.2.53'], search_domains=['Example.com', 'lab.example.com'])),
+            (firewall_ruleset, dict(name='webAccess', allowed_all=True,
+                                    allowed_ips=['192.0.2.200', '198.51.100.0/24'])),
+            (firewall_ruleset, dict(name='webAccess', allowed_ips=['192.0.2.201'])),
+            (nic, dict(name='vmnic1', enabled=False, auto_negotiate=False, wake_on_lan='ug')),
+        ]
+        for module, args in cases:
+            first = run_module(module, self.args(**args))
+            self.assertEqual((first.failed, first.result.get('changed')), (False, True), (args, first.result))
+            second = run_module(module, self.args(**args))
+            self.assertEqual((second.failed, second.result.get('changed')), (False, False), (args, second.result))
+        # What the commands would have reset is as it was.
+        self.assertEqual(self.hadrocli('network', 'ip', 'interface', 'ipv4', 'get', '-i', 'tkn1')[0]['Gateway'],
+                         '198.51.100.1')
+        self.assertEqual(self.hadrocli('network', 'ip', 'interface', 'ipv6', 'get', '-n', 'tkn0')[0]['Gateway'],
+                         '2001:db8:10::1')
 
     def test_check_mode_plans_and_changes_nothing(self):
         before = self.export()

@@ -52,7 +52,7 @@ t() {
 export_all() {
     for i in $(seq -w 1 $HOSTS); do "$SIM" --state="$work/host$i.json" export >"$work/$1-host$i.json"; done
 }
-# play NAME ARGS...: runs ansible-playbook, its output in $work/NAME.out, its duration in seconds
+# play NAME ARGS...: runs ansible-playbook, its output in $work/NAME.out, its duration
 # in $work/NAME.ms (milliseconds); the status is ansible-playbook's.
 play() {
     local name=$1

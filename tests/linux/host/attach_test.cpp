@@ -127,7 +127,8 @@ TEST_F(AttachTest, AnInterfaceIsAVethPairWhoseBridgeEndIsAPortOfThePortGroupsSwi
     ASSERT_TRUE(Ok("network ip interface remove -p pg2"));
     EXPECT_FALSE(Exists("tkn2-port"));
     EXPECT_EQ(Record(PortGroupList(), "pg")["Active Clients"], 0);
-    for (const auto& group : Document()["vswitches"]["vs1"]["portGroups"])
+    const json document = Document();
+    for (const auto& group : document["vswitches"]["vs1"]["portGroups"])
         EXPECT_EQ(group["ports"], json::array()) << group;
     EXPECT_EQ(Link("vs1")["address"], bridgeMac);
 }

@@ -116,7 +116,8 @@ std::vector<Message> Exchange(const Namespace& ns, Message request, const std::s
     nl_sock* sock = RouteSocket(ns);
     Check(nl_send_auto(sock, request.get()), what);
     // The socket's own callbacks stay as they are: the replies are read through a copy.
-    std::unique_ptr<nl_cb, CallbackPut> cb(nl_cb_clone(nl_socket_get_cb(sock)));
+    std::unique_ptr<nl_cb, CallbackPut> own(nl_socket_get_cb(sock));  // a reference of our own
+    std::unique_ptr<nl_cb, CallbackPut> cb(nl_cb_clone(own.get()));
     if (!cb) throw HostCtlException(what + ": out of memory");
     std::vector<Message> replies;
     bool acknowledged = false;
@@ -131,7 +132,7 @@ std::vector<Message> Exchange(const Namespace& ns, Message request, const std::s
 // Sends a change and waits for the kernel's answer.
 void Send(const Namespace& ns, nl_msg* request, const std::string& what) {
     Check(nl_send_sync(RouteSocket(ns), request), what);  // frees the request
-    Changed();  // what was read of the kernel before is read again
+    Changed();                                            // what was read of the kernel before is read again
 }
 
 Message Dump(int type, int family, std::size_t headerSize) {

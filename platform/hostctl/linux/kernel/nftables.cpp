@@ -241,24 +241,31 @@ std::string BuildFirewall(const NftFirewall& firewall) {
     for (const auto& rule : firewall.dynamicRules)
         commands.push_back(PortRule(kRuntimeChain, rule, nullptr, {}));
     if (firewall.enabled) {
+        // (Lists of expressions are made with json::array: a braced list of one value would be
+        // taken for that value by some compilers.)
+        const json accept = {{"accept", nullptr}};
+        commands.push_back(
+            Rule(kInputChain, json::array({Match(json{{"meta", {{"key", "iifname"}}}}, "lo"), accept})));
+        json established = {{"match",
+                             {{"op", "in"},
+                              {"left", {{"ct", {{"key", "state"}}}}},
+                              {"right", json::array({"established", "related"})}}}};
+        commands.push_back(Rule(kInputChain, json::array({established, accept})));
         commands.push_back(Rule(
-            kInputChain, {Match(json{{"meta", {{"key", "iifname"}}}}, "lo"), json{{"accept", nullptr}}}));
-        commands.push_back(Rule(kInputChain, {json{{"match",
-                                                    {{"op", "in"},
-                                                     {"left", {{"ct", {{"key", "state"}}}}},
-                                                     {"right", {"established", "related"}}}}},
-                                              json{{"accept", nullptr}}}));
-        commands.push_back(Rule(kInputChain, {Match(json{{"meta", {{"key", "l4proto"}}}}, "ipv6-icmp"),
-                                              json{{"accept", nullptr}}}));
-        for (const auto& ruleset : firewall.rulesets)
-            commands.push_back(Rule(kInputChain, {json{{"jump", {{"target", ruleset.name}}}}}));
-        commands.push_back(Rule(kInputChain, {json{{"jump", {{"target", kRuntimeChain}}}}}));
+            kInputChain, json::array({Match(json{{"meta", {{"key", "l4proto"}}}}, "ipv6-icmp"), accept})));
+        for (const auto& ruleset : firewall.rulesets) {
+            json jump = {{"jump", {{"target", ruleset.name}}}};
+            commands.push_back(Rule(kInputChain, json::array({jump})));
+        }
+        json runtime = {{"jump", {{"target", kRuntimeChain}}}};
+        commands.push_back(Rule(kInputChain, json::array({runtime})));
     }
     return json{{"nftables", std::move(commands)}}.dump();
 }
 
 std::string BuildFirewallDelete() {
-    return json{{"nftables", {json{{"delete", Object("table", json::object())}}}}}.dump();
+    json remove = {{"delete", Object("table", json::object())}};
+    return json{{"nftables", json::array({remove})}}.dump();
 }
 
 // ---------------------------------------------------------------- the table as read

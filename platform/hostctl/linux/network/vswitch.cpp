@@ -454,7 +454,8 @@ std::vector<std::string> LinuxSwitches::List() {
 }
 
 bool LinuxSwitches::Has(const std::string& name) {
-    const auto* link = Look().Find(name);
+    const auto view = Look();
+    const auto* link = view.Find(name);
     return link && link->bridge;
 }
 
@@ -516,7 +517,8 @@ void LinuxSwitches::Add(const std::string& name, std::uint32_t numPorts,
         if (!bridge || !bridge->bridge || !bridge->up)
             throw HostCtlException("Bridge " + name + " is not there, up, after it was made");
     } catch (...) {
-        if (const auto* made = Look().Find(name)) Kernel::DeleteLink(own, made->index, name);
+        const auto after = Look();
+        if (const auto* made = after.Find(name)) Kernel::DeleteLink(own, made->index, name);
         throw;
     }
     auto records = Records();

@@ -147,11 +147,48 @@ protected:
     }
 };
 
+// A command of a dry run (--dry-run) runs on a session that changes nothing: its checks and
+// the host's refusals run as for real, its messages go to err as usual and its status is the
+// one the real run would have as far as it can be known; its result is not shown (the calls
+// it made are, by WriteDryRunLines). A dry run that went as far as it could (DryRunEnd: a step
+// needs what an earlier one would have made) has found nothing wrong up to there: status 0.
+int ExecuteDryRun(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invocation, std::ostream& err) {
+    try {
+        auto output = dispatcher.ExecuteRaw(invocation);
+        for (const auto& message : output->GetErrorMessages())
+            err << Zorbel::Format::TerminalSafeLines(message) << '\n';
+        return Dispatcher::StatusOf(*output);
+    } catch (const HostCtl::Lib::DryRunEnd&) {
+        return Zorbel::AutoCli::EXIT_OK;
+    } catch (const std::exception& e) {
+        err << "Error: unexpected failure in '" << invocation.path
+            << "': " << Zorbel::Format::TerminalSafeLines(e.what()) << '\n';
+    } catch (...) {
+        err << "Error: unexpected failure in '" << invocation.path << "'\n";
+    }
+    return Zorbel::AutoCli::EXIT_UNEXPECTED;
+}
+
+// The command of a command line: for real, or as a dry run.
+int ExecuteCommand(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invocation,
+                   const GlobalOptions& options, std::ostream& out, std::ostream& err) {
+    if (options.dryRun) return ExecuteDryRun(dispatcher, invocation, err);
+    return dispatcher.Execute(invocation, options, out, err);
+}
+
+// What a dry run recorded since last asked, one line each (the host's names escaped, as in
+// every output).
+void WriteDryRunLines(HostCtl::Lib::HostSession& session, std::ostream& out) {
+    for (const auto& line : session.TakeDryRunLines())
+        out << Zorbel::Format::TerminalSafe(line) << '\n';
+}
+
 // Runs the command as one transaction on the host state: the session is opened only now
 // that a command is really going to run (help, listings and refusals never touch the
 // state), and committed when the command ran to its end (status 0 or 1). An exception that
 // escaped the command (status 3) discards its changes. The command's output is held back
 // until the state is safely written, so that a failed write is never reported as success.
+// A dry run commits nothing but the session's memory, and shows the calls instead of the result.
 int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invocation,
                  const GlobalOptions& options) {
     using HostCtl::Lib::HostSession;
@@ -164,9 +201,11 @@ int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invo
     std::unique_ptr<HostSession> session;
     try {
         session = OpenSession(options);
+        if (options.dryRun) session->StartDryRun();
         dispatcher.KeepLastResult(true);
-        status = dispatcher.Execute(invocation, options, out, err);
+        status = ExecuteCommand(dispatcher, invocation, options, out, err);
         if (status == Zorbel::AutoCli::EXIT_OK || status == Zorbel::AutoCli::EXIT_FAILED) session->Commit();
+        if (options.dryRun) WriteDryRunLines(*session, out);
     } catch (const StateFileError& e) {
         std::cerr << "Error: " << e.what() << '\n';
         return Zorbel::AutoCli::EXIT_UNEXPECTED;
@@ -245,7 +284,10 @@ bool SplitBatchLine(const std::string& line, std::vector<std::string>& words, st
 // transaction: it stops at the first line that does not succeed, writes nothing, prints
 // nothing on stdout, and the state is written once at the end when every line succeeded.
 // A failing line is reported on stderr as "line N: TEXT" after its own messages. The exit
-// status is 0 when every line succeeded, else that of the first failing line.
+// status is 0 when every line succeeded, else that of the first failing line. With --dry-run
+// every line is a dry run (a line may not say so itself): the session commits in memory only,
+// so that a line sees what the lines before it would have changed, and each line's output is
+// the calls it made.
 int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
     using HostCtl::Lib::HostSession;
     using HostCtl::Lib::StateFileError;
@@ -286,7 +328,7 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             err << "Error: " << error << '\n';
             status = Zorbel::AutoCli::EXIT_REFUSED;
         } else if (!own.statePath.empty() || !own.pluginDirs.empty() || !own.batch.empty() || own.atomic ||
-                   !own.backend.empty()) {
+                   !own.backend.empty() || own.dryRun) {
             err << "Error: only --formatter and --format-param may stand before the words of a batch line\n";
             status = Zorbel::AutoCli::EXIT_REFUSED;
         } else {
@@ -294,6 +336,7 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             lineOptions.statePath = options.statePath;
             lineOptions.backend = options.backend;
             lineOptions.pluginDirs = options.pluginDirs;
+            lineOptions.dryRun = options.dryRun;
             if (!own.formatterGiven) {
                 lineOptions.formatter = options.formatter;
                 lineOptions.formatterGiven = options.formatterGiven;
@@ -305,8 +348,11 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             status = prepared.status;
             if (prepared.ready) {
                 try {
-                    if (!session) session = OpenSession(options);
-                    status = dispatcher.Execute(prepared.invocation, lineOptions, out, err);
+                    if (!session) {
+                        session = OpenSession(options);
+                        if (options.dryRun) session->StartDryRun();
+                    }
+                    status = ExecuteCommand(dispatcher, prepared.invocation, lineOptions, out, err);
                     if (!options.atomic) {
                         // As for a single command line: a command that ran to its end is
                         // committed, one that ended in an unexpected failure leaves nothing.
@@ -316,6 +362,8 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
                             session->Rollback();
                         }
                     }
+                    // The line's calls, after the line's own output (a dry run has none).
+                    if (options.dryRun) WriteDryRunLines(*session, out);
                 } catch (const StateFileError& e) {
                     // The state cannot be used: no later line could run either.
                     std::cerr << "Error: " << e.what() << '\n'

@@ -34,6 +34,7 @@ public:
     void Commit() override { context_->Commit(); }
     void Discard() override { context_->Discard(); }
     bool HasChanges() const override { return context_->HasChanges(); }
+    void StartDryRun(Backend::DryRunRecorder record) override { context_->StartDryRun(std::move(record)); }
 
 private:
     template <class T>

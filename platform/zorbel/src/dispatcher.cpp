@@ -116,6 +116,8 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
             options.batch = value;
         } else if (arg == "--atomic") {
             options.atomic = true;
+        } else if (arg == "--dry-run") {
+            options.dryRun = true;
         } else if (arg == "--manual") {
             options.manual = "man";
         } else if (StartsWith(arg, "--manual=")) {

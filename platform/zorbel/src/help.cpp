@@ -247,6 +247,9 @@ std::vector<std::pair<std::string, std::string>> GlobalOptionRows() {
         {"--batch=FILE",
          "Run the command lines of FILE (- for standard input), one per line, in one session."},
         {"--atomic", "With --batch: every line must succeed, else nothing is changed."},
+        {"--dry-run",
+         "Check the command and list the host-control calls it would make (on a Linux host also each "
+         "kernel request) instead of its result; nothing is changed."},
         {"--manual[=markdown]",
          "Write the manual page (troff) of every command; with =markdown, the command reference in "
          "Markdown."},

@@ -193,7 +193,7 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
             if (!parameter) {
                 error = "unknown option --" + Shown(name);
                 if (name == "formatter" || name == "state" || name == "plugin-dir" || name == "backend" ||
-                    name == "format-param") {
+                    name == "format-param" || name == "dry-run") {
                     error += " (global options go before the first word)";
                 }
                 return false;

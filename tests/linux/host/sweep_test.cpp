@@ -2,6 +2,7 @@
 // bridges, four NICs, two netstacks, addresses, routes, a neighbour, a foreign nftables table
 // and an xfrm policy. Each either works or gives its documented refusal; none ends in an
 // unexpected failure, and none that is refused leaves the host changed.
+#include <algorithm>
 #include <set>
 #include <string>
 #include <vector>
@@ -314,6 +315,39 @@ TEST_F(LinuxSweepTest, TheSweepReachesEveryCommand) {
             reached |= !longer;
         }
         EXPECT_TRUE(reached) << command << " is not in the sweep";
+    }
+}
+
+// The same sweep, each line first as a dry run: it changes nothing, and ends as the real run
+// does (the same status, the same refusal), but where only the kernel or a driver refuses the
+// change when it is made, which a dry run does not do.
+TEST_F(LinuxSweepTest, EveryCommandAsADryRunChangesNothingAndEndsAsTheRealRun) {
+    const std::set<std::string> refusedWhenMade = {
+        "ip ipsec sa add",      // no ESP in this kernel
+        "nic pauseParams set",  // the driver (veth) has none of these
+        "nic eeprom change",    // the dry run says there is no EEPROM, the driver that it cannot
+        "nic negotiate restart", "nic selftest run", "nic ring current set",
+    };
+    BuildHost();
+    for (const auto& line : Lines()) {
+        const std::string before = Snapshot();
+        auto dry = Hadro(std::string("--dry-run network ") + line.command);
+        const std::string after = Snapshot();
+        EXPECT_TRUE(after == before) << line.command << " changed the host in a dry run:\n"
+                                     << Difference(before, after);
+        EXPECT_EQ(dry.err.find("unexpected"), std::string::npos) << line.command << "\n" << dry.err;
+        auto real = Hadro(std::string("network ") + line.command);
+        const std::string command = line.command;
+        const bool whenMade = std::any_of(refusedWhenMade.begin(), refusedWhenMade.end(),
+                                          [&](const auto& prefix) { return command.rfind(prefix, 0) == 0; });
+        if (whenMade) {
+            EXPECT_EQ(real.status, 1) << line.command;
+            continue;
+        }
+        EXPECT_EQ(dry.status, real.status) << line.command << "\n" << dry.All() << "\n" << real.All();
+        if (real.status != 0) {
+            EXPECT_EQ(dry.err, real.err) << line.command;
+        }
     }
 }
 

@@ -10,6 +10,7 @@
 #include <exception>
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace HostCtl::Lib {
 
@@ -24,6 +25,20 @@ public:
 
 private:
     std::string message_;
+};
+
+// A dry run that cannot go further: a step needs what an earlier step would have made (the
+// namespace of a netstack it would create, say). The last line the dry run recorded says what
+// the real run would do next; what() says it too. Deliberately not a HostCtlException: no
+// command turns it into an error message, so that the program can end the dry run there.
+class DryRunEnd : public std::exception {
+public:
+    explicit DryRunEnd(std::string next);
+    ~DryRunEnd() override;
+    const char* what() const noexcept override { return next_.c_str(); }
+
+private:
+    std::string next_;
 };
 
 // The state file to use: given when not empty, else $HADRO_STATE when set and not empty,
@@ -96,6 +111,18 @@ public:
     void Reset();
     // (Export, Replace and Reset concern the simulated host's document: on the Linux host
     // they throw StateFileError.)
+    // Dry run: from now on the session changes nothing outside its own memory. Commit writes no
+    // state file (on a real host no document, and its kernel requests are recorded instead of
+    // made), so that the command's checks and the host's refusals run as for real. Every
+    // host-control call is recorded as the journal records it, "OPERATION TARGET ARGUMENTS",
+    // whether the journal is on or not (the journal itself is left alone); on a real host each
+    // kernel request follows the call that made it, as "kernel: ..." (see the host's README).
+    // A session does not leave its dry run.
+    void StartDryRun();
+    bool IsDryRun() const;
+    // The lines recorded since the dry run started or since they were last taken; a dry run
+    // that ended early (DryRunEnd) records again from here.
+    std::vector<std::string> TakeDryRunLines();
     // The state file's path; empty for an in-memory session and on the Linux host.
     const std::string& GetPath() const;
     // Which host the session manages.

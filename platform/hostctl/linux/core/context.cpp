@@ -16,6 +16,10 @@ using HostCtl::Lib::HostCtlException;
 
 Context::Context(Config config) : config_(std::move(config)), document_(config_.statePath) {}
 
+Context::~Context() {
+    if (dryRun_) Kernel::SetDryRun({});
+}
+
 bool Context::HasNetAdmin() {
     // CapEff in /proc/self/status: the effective capabilities as a hexadecimal mask;
     // CAP_NET_ADMIN is bit 12.
@@ -30,7 +34,12 @@ bool Context::HasNetAdmin() {
 
 void Context::BeginChange() {
     if (!HasNetAdmin()) throw HostCtlException(kNeedsRoot);
-    document_.Lock();
+    if (!Kernel::DryRun()) document_.Lock();
+}
+
+void Context::StartDryRun(Kernel::DryRunRecorder record) {
+    Kernel::SetDryRun(std::move(record));
+    dryRun_ = true;
 }
 
 std::vector<std::string> Context::Netstacks() const {
@@ -43,6 +52,10 @@ std::vector<std::string> Context::Netstacks() const {
         }
         closedir(dir);
     }
+    for (auto& planned : Kernel::PlannedNamespaces()) {
+        if (std::find(names.begin(), names.end(), planned) == names.end())
+            names.push_back(std::move(planned));
+    }
     std::sort(names.begin(), names.end());
     names.insert(names.begin(), kDefaultNetstack);
     return names;
@@ -51,6 +64,7 @@ std::vector<std::string> Context::Netstacks() const {
 bool Context::HasNetstack(const std::string& netstack) const {
     if (netstack.empty() || netstack == kDefaultNetstack) return true;
     if (netstack.find('/') != std::string::npos || netstack == "." || netstack == "..") return false;
+    if (Kernel::IsPlannedNamespace(netstack)) return true;
     std::string path = std::string(Kernel::kNamedNamespaces) + "/" + netstack;
     return access(path.c_str(), F_OK) == 0;
 }

@@ -9,6 +9,7 @@
 
 #include "core/config.h"
 #include "core/document.h"
+#include "kernel/dryrun.h"
 #include "kernel/netlink.h"
 
 namespace TknCtl::Linux {
@@ -21,19 +22,27 @@ public:
     static constexpr const char* kNeedsRoot = "Changing the host's network needs root (CAP_NET_ADMIN)";
 
     explicit Context(Config config);
+    // A dry run the context started ends with it.
+    ~Context();
+    Context(const Context&) = delete;
+    Context& operator=(const Context&) = delete;
 
     const Config& GetConfig() const { return config_; }
     Document& GetDocument() { return document_; }
 
     // Every operation that changes the host calls this before it changes anything: without
-    // CAP_NET_ADMIN it throws HostCtlException(kNeedsRoot); then it takes the document's lock
-    // (once per session) so that what the command stores lands on what is there now.
+    // CAP_NET_ADMIN it throws HostCtlException(kNeedsRoot), in a dry run too (the real run
+    // would be refused); then it takes the document's lock (once per session) so that what the
+    // command stores lands on what is there now (a dry run, which writes nothing, takes none).
     void BeginChange();
+    // From now on kernel changes are recorded instead of made (kernel/dryrun.h), and the
+    // document is kept in memory only.
+    void StartDryRun(Kernel::DryRunRecorder record);
     // Whether the program has CAP_NET_ADMIN.
     static bool HasNetAdmin();
 
     // The netstacks the kernel has: the default first, then the named namespaces of
-    // /run/netns in name order.
+    // /run/netns in name order (with those a dry run would make).
     std::vector<std::string> Netstacks() const;
     bool HasNetstack(const std::string& netstack) const;
     // The namespace of a netstack the kernel has; throws HostCtlException("Netstack instance
@@ -52,6 +61,7 @@ private:
     Config config_;
     Document document_;
     std::set<std::string> warned_;
+    bool dryRun_ = false;
 };
 
 }  // namespace TknCtl::Linux

@@ -10,6 +10,7 @@
 #include <nlohmann/json.hpp>
 
 #include "hostctl/session.h"
+#include "kernel/dryrun.h"
 
 namespace TknCtl::Linux {
 
@@ -98,7 +99,9 @@ const json& Document::Read(const std::string& member) {
 }
 
 json& Document::Write(const std::string& member) {
-    if (!IsLocked()) Lock();
+    // A dry run changes the document in memory only, and takes no lock (it writes no file).
+    if (!IsLocked() && !Kernel::DryRun()) Lock();
+    if (!loaded_) Load();
     return (*current_)[member];
 }
 
@@ -129,6 +132,20 @@ void Document::Discard() {
 
 void Document::Commit() {
     if (!HasChanges()) return;
+    if (Kernel::DryRun()) {
+        // Kept in memory (the next command of a batch sees it); the line says what would be written.
+        std::string members;
+        for (const auto& [member, value] : current_->items()) {
+            auto before = base_->find(member);
+            if (before == base_->end() || *before != value) members += (members.empty() ? "" : ", ") + member;
+        }
+        for (const auto& [member, value] : base_->items()) {
+            if (!current_->contains(member)) members += (members.empty() ? "" : ", ") + member;
+        }
+        Kernel::Record("file write " + path_ + " (the host's document: " + members + ")");
+        *base_ = *current_;
+        return;
+    }
     if (!IsLocked()) Refuse({}, "changed without its lock");
     (*current_)["version"] = kVersion;
     std::string text = current_->dump(2) + "\n";

@@ -24,6 +24,9 @@
 #include <memory>
 #include <set>
 
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
+
 #ifndef SOL_NETLINK
 #define SOL_NETLINK 270
 #endif
@@ -452,7 +455,7 @@ void Transact(nl_sock* sock, nl_msg* request, const std::function<void(nl_msg*)>
     }
 }
 
-Ethtool::Ethtool(const Namespace& ns) : sock_(Socket(NETLINK_GENERIC, ns)) {
+Ethtool::Ethtool(const Namespace& ns) : sock_(Socket(NETLINK_GENERIC, ns)), ns_(ns) {
     // Family numbers are the kernel's, the same in every namespace.
     static int family = 0;
     if (family <= 0) {
@@ -473,6 +476,16 @@ std::optional<EthtoolReply> Ethtool::Send(nl_msg* request) {
         if (!reply) reply = ParseEthtoolReply(message);
     });
     return reply;
+}
+
+void Ethtool::Set(nl_msg* request) {
+    if (DryRun()) {
+        Message owned(request);
+        const std::string what = DescribeEthtoolRequest(request);
+        return Record(
+            what.empty() ? "ethtool request " + std::to_string(nlmsg_hdr(request)->nlmsg_type) : what, ns_);
+    }
+    Send(request);
 }
 
 EthtoolReply Ethtool::Get(std::uint8_t command, const std::string& device, std::uint32_t flags) {
@@ -606,6 +619,13 @@ std::vector<std::uint8_t> ReadEeprom(const std::string& device, std::uint32_t of
 
 void WriteEeprom(const std::string& device, std::uint32_t magic, std::uint32_t offset,
                  const std::vector<std::uint8_t>& bytes) {
+    if (DryRun()) {
+        char text[16];
+        std::snprintf(text, sizeof text, "0x%x", magic);
+        return Record("ethtool eeprom write " + device + " magic " + text + " offset " +
+                          std::to_string(offset) + " length " + std::to_string(bytes.size()),
+                      Namespace::Own());
+    }
     Variable<ethtool_eeprom> eeprom(bytes.size());
     eeprom->cmd = ETHTOOL_SEEPROM;
     eeprom->magic = magic;
@@ -616,6 +636,10 @@ void WriteEeprom(const std::string& device, std::uint32_t magic, std::uint32_t o
 }
 
 SelfTest RunSelfTest(const std::string& device, bool online, std::uint32_t testCount) {
+    if (DryRun()) {
+        Record("ethtool selftest " + device + (online ? " online" : " offline"), Namespace::Own());
+        return {};
+    }
     Variable<ethtool_test> test(testCount * sizeof(std::uint64_t));
     test->cmd = ETHTOOL_TEST;
     test->flags = online ? 0 : ETH_TEST_FL_OFFLINE;
@@ -639,6 +663,7 @@ SelfTest RunSelfTest(const std::string& device, bool online, std::uint32_t testC
 }
 
 void RestartNegotiation(const std::string& device) {
+    if (DryRun()) return Record("ethtool autoneg restart " + device, Namespace::Own());
     ethtool_value value{};
     value.cmd = ETHTOOL_NWAY_RST;
     Ioctl(device, &value);
@@ -658,6 +683,17 @@ std::vector<std::uint32_t> ReadRssTable(const std::string& device) {
 }
 
 void WriteRssTable(const std::string& device, const std::vector<std::uint32_t>& table) {
+    if (DryRun()) {
+        std::set<std::uint32_t> queues(table.begin(), table.end());
+        std::string text;
+        for (auto queue : queues)
+            text += " " + std::to_string(queue);
+        return Record(
+            "ethtool rss set " + device +
+                (table.empty() ? std::string(" default")
+                               : " table of " + std::to_string(table.size()) + " entries to queues" + text),
+            Namespace::Own());
+    }
     Variable<ethtool_rxfh_indir> indir(table.size() * sizeof(std::uint32_t));
     indir->cmd = ETHTOOL_SRXFHINDIR;
     indir->size = static_cast<std::uint32_t>(table.size());

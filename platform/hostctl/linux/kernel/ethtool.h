@@ -139,12 +139,14 @@ public:
     // Sends a request (it is freed) and reads its reply, if the kernel sends one; throws
     // EthtoolRefusal.
     std::optional<EthtoolReply> Send(nl_msg* request);
-    // The same for a change: the kernel's acknowledgement is all that comes back.
-    void Set(nl_msg* request) { Send(request); }
+    // The same for a change: the kernel's acknowledgement is all that comes back. (A dry run
+    // records it instead: kernel/dryrun.h.)
+    void Set(nl_msg* request);
 
 private:
     nl_sock* sock_;
     int family_;
+    Namespace ns_;
 };
 
 // ---------------------------------------------------------------- the ioctl

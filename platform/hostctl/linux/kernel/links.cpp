@@ -17,6 +17,7 @@
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/dryrun.h"
 #include "kernel/request.h"
 
 namespace TknCtl::Linux::Kernel {
@@ -235,16 +236,28 @@ std::vector<Link> ListLinks(const Namespace& ns, bool withStats) {
         },
         "cannot list the network devices");
     std::sort(links.begin(), links.end(), [](const Link& a, const Link& b) { return a.index < b.index; });
+    if (DryRun()) ApplyLinkPlans(LinkPlans(), ns.Name(), links);
     return links;
 }
 
-std::optional<Link> FindLink(const Namespace& ns, const std::string& name) {
+namespace {
+
+std::optional<Link> FindKernelLink(const Namespace& ns, const std::string& name) {
     rtnl_link* object = nullptr;
     int error = rtnl_link_get_kernel(RouteSocket(ns), 0, name.c_str(), &object);
     if (error == -NLE_OBJ_NOTFOUND || error == -NLE_NODEV) return std::nullopt;
     Check(error, "cannot read network device " + name);
     LinkObject owned(object);
     return LinkFromObject(object);
+}
+
+}  // namespace
+
+std::optional<Link> FindLink(const Namespace& ns, const std::string& name) {
+    // A dry run's links as it would leave them (in a namespace it would make, its links only).
+    if (IsPlannedNamespace(ns)) return ApplyLinkPlans(LinkPlans(), ns.Name(), name, std::nullopt);
+    if (DryRun()) return ApplyLinkPlans(LinkPlans(), ns.Name(), name, FindKernelLink(ns, name));
+    return FindKernelLink(ns, name);
 }
 
 nl_msg* BuildLinkChange(int index, const LinkChange& change) {

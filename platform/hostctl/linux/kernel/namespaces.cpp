@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "hostctl/exception.h"
+#include "kernel/dryrun.h"
 #include "kernel/links.h"
 #include "kernel/netlink.h"
 
@@ -55,12 +56,21 @@ bool IsNamespaceName(const std::string& name) {
 
 bool NamedNamespaceExists(const std::string& name) {
     if (!IsNamespaceName(name)) return false;
+    if (IsPlannedNamespace(name)) return true;
     struct stat info {};
     return lstat(PathOf(name).c_str(), &info) == 0;
 }
 
 void AddNamedNamespace(const std::string& name) {
     std::string path = PathOf(name);
+    if (DryRun()) {
+        if (NamedNamespaceExists(name))
+            throw HostCtlException("network namespace " + name + " exists already");
+        Record("namespace add " + name);
+        PlanNamespace(name, true);
+        Record("link set lo up", Namespace::Named(name));
+        return;
+    }
     PrepareNamespaceDirectory();
     int file = open(path.c_str(), O_RDONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0);
     if (file < 0) {
@@ -108,6 +118,10 @@ void AddNamedNamespace(const std::string& name) {
 
 void DeleteNamedNamespace(const std::string& name) {
     std::string path = PathOf(name);
+    if (DryRun()) {
+        Record("namespace delete " + name);
+        return PlanNamespace(name, false);
+    }
     ForgetSockets(Namespace::Named(name));
     // EINVAL: a file left without its namespace; it goes all the same.
     if (umount2(path.c_str(), MNT_DETACH) != 0 && errno != EINVAL && errno != ENOENT)
@@ -118,6 +132,12 @@ void DeleteNamedNamespace(const std::string& name) {
 
 bool MakeNamespaceFiles(const std::string& name) {
     if (!IsNamespaceName(name)) return false;
+    if (DryRun()) {
+        const std::string dir = std::string(kNamespaceFiles) + "/" + name;
+        struct stat info {};
+        if (stat(dir.c_str(), &info) != 0) Record("file mkdir " + dir);
+        return true;
+    }
     if (mkdir(kNamespaceFiles, 0755) != 0 && errno != EEXIST) return false;
     std::string dir = std::string(kNamespaceFiles) + "/" + name;
     return mkdir(dir.c_str(), 0755) == 0 || errno == EEXIST;
@@ -136,6 +156,10 @@ bool RemoveNamespaceFiles(const std::string& name) {
     closedir(listing);
     for (const auto& file : files) {
         if (file != "resolv.conf") return false;
+    }
+    if (DryRun()) {
+        Record("file remove " + dir + (files.empty() ? "" : " (with its resolv.conf)"));
+        return true;
     }
     if (!files.empty() && unlink((dir + "/resolv.conf").c_str()) != 0) return false;
     return rmdir(dir.c_str()) == 0;

@@ -13,6 +13,7 @@
 #include <utility>
 
 #include "hostctl/exception.h"
+#include "kernel/dryrun.h"
 
 namespace TknCtl::Linux::Kernel {
 
@@ -46,6 +47,8 @@ std::string Namespace::Path() const {
 
 void Namespace::Run(const std::function<void()>& fn) const {
     if (IsOwn()) return fn();
+    if (IsPlannedNamespace(name_))
+        StopDryRun("work inside netstack " + name_ + ", which this dry run does not make");
     int own = OwnNamespaceFd();
     int fd = open(Path().c_str(), O_RDONLY | O_CLOEXEC);
     if (fd < 0) {

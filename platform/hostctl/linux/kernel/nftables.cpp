@@ -10,6 +10,8 @@
 #include <set>
 
 #include "hostctl/exception.h"
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
 
 // The library's header defines _GNU_SOURCE itself; the compiler already has.
 #undef _GNU_SOURCE
@@ -479,6 +481,7 @@ struct Nftables::Library {
     decltype(&nft_ctx_buffer_error) bufferError = nullptr;
     decltype(&nft_ctx_get_output_buffer) outputBuffer = nullptr;
     decltype(&nft_ctx_get_error_buffer) errorBuffer = nullptr;
+    decltype(&nft_ctx_set_dry_run) setDryRun = nullptr;
     nft_ctx* ctx = nullptr;
 };
 
@@ -525,6 +528,7 @@ Nftables::Nftables(const std::string& library) : library_(std::make_unique<Libra
     Resolve(lib.handle, library, "nft_ctx_buffer_error", lib.bufferError);
     Resolve(lib.handle, library, "nft_ctx_get_output_buffer", lib.outputBuffer);
     Resolve(lib.handle, library, "nft_ctx_get_error_buffer", lib.errorBuffer);
+    Resolve(lib.handle, library, "nft_ctx_set_dry_run", lib.setDryRun);
     lib.ctx = lib.ctxNew(NFT_CTX_DEFAULT);
     if (!lib.ctx) throw HostCtlException(std::string(kUnavailable) + "libnftables cannot make a context");
     // JSON out, and so JSON in as well.
@@ -553,6 +557,16 @@ Nftables::Result Nftables::Run(const std::string& commands) {
     return result;
 }
 
+Nftables::Result Nftables::Check(const std::string& commands) {
+    auto& lib = *library_;
+    lib.setDryRun(lib.ctx, true);
+    struct Back {
+        Library& lib;
+        ~Back() { lib.setDryRun(lib.ctx, false); }
+    } back{lib};
+    return Run(commands);
+}
+
 // ---------------------------------------------------------------- the kernel
 
 namespace {
@@ -570,6 +584,7 @@ namespace {
 }  // namespace
 
 std::optional<NftFirewall> ReadFirewall(std::vector<std::string>* unknown) {
+    if (DryRun() && PlannedFirewall()) return *PlannedFirewall();
     auto result = Nftables::Get().Run(std::string("list table ") + kFirewallFamily + " " + kFirewallTable);
     if (!result.ok) {
         if (result.error.find("No such file or directory") != std::string::npos) return std::nullopt;
@@ -586,11 +601,21 @@ bool IsNftName(const std::string& name) {
 }
 
 void WriteFirewall(const NftFirewall& firewall) {
-    auto result = Nftables::Get().Run(BuildFirewall(firewall));
+    // A dry run has the kernel check the table, so that it refuses what it would refuse.
+    auto result = DryRun() ? Nftables::Get().Check(BuildFirewall(firewall))
+                           : Nftables::Get().Run(BuildFirewall(firewall));
+    if (result.ok && DryRun()) {
+        Record(DescribeFirewall(firewall), Namespace::Own());
+        return PlanFirewall(firewall);
+    }
     if (!result.ok) Refuse("The kernel refused the firewall's nftables table inet hadro", result.error);
 }
 
 void DeleteFirewall() {
+    if (DryRun()) {
+        Record(DescribeFirewallDelete(), Namespace::Own());
+        return PlanFirewall(std::nullopt);
+    }
     auto result = Nftables::Get().Run(BuildFirewallDelete());
     if (!result.ok && result.error.find("No such file or directory") == std::string::npos)
         Refuse("The kernel refused to delete the firewall's nftables table inet hadro", result.error);

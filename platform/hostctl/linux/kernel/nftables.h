@@ -121,6 +121,8 @@ public:
     };
     // Runs commands, as nft text or as JSON ({"nftables": [...]}), in one transaction.
     Result Run(const std::string& commands);
+    // The same, checked by the kernel and abandoned: nothing is changed (nft --check).
+    Result Check(const std::string& commands);
 
 private:
     struct Library;

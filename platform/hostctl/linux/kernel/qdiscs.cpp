@@ -13,6 +13,8 @@
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
 
 namespace TknCtl::Linux::Kernel {
 
@@ -116,6 +118,7 @@ nl_msg* BuildTokenBucket(int link, const TokenBucket& bucket) {
 }
 
 void ReplaceTokenBucket(const Namespace& ns, int link, const std::string& name, const TokenBucket& bucket) {
+    if (DryRun()) return Record(DescribeTokenBucket(name, bucket), ns);
     Check(nl_send_sync(RouteSocket(ns), BuildTokenBucket(link, bucket)),
           "Cannot shape the traffic of " + name + " with a token bucket");
 }
@@ -129,6 +132,7 @@ nl_msg* BuildRootDelete(int link) {
 }
 
 void DeleteRootQdisc(const Namespace& ns, int link, const std::string& name) {
+    if (DryRun()) return Record(DescribeRootDelete(name), ns);
     Check(nl_send_sync(RouteSocket(ns), BuildRootDelete(link)), "Cannot remove the token bucket of " + name);
 }
 

@@ -19,6 +19,7 @@
 #include <vector>
 
 #include "hostctl/exception.h"
+#include "kernel/dryrun.h"
 
 #ifndef SOL_NETLINK
 #define SOL_NETLINK 270
@@ -111,6 +112,10 @@ std::string RefusalText(const Answer& answer) {
 
 Answer TryRequest(const Namespace& ns, nl_msg* message) {
     std::unique_ptr<nl_msg, MessageFree> owned(message);
+    if (DryRun()) {
+        RehearseRequest(ns, nlmsg_hdr(message));
+        return {};
+    }
     nl_sock* sock = RouteSocket(ns);
     AskForReasons(sock);
     Changed();
@@ -166,6 +171,8 @@ private:
 void Dump(const Namespace& ns, int type, const void* header, std::size_t size,
           const std::function<void()>& restart, const std::function<void(const nlmsghdr*)>& each,
           const std::string& what) {
+    // A namespace a dry run would make holds nothing yet.
+    if (IsPlannedNamespace(ns)) return restart();
     DumpSocket sock(ns);
     // A dump comes in messages of at most 32 KiB (the kernel's bound for a reader's buffer).
     std::vector<char> buffer(64 * 1024);

@@ -11,6 +11,8 @@
 #include <sstream>
 
 #include "hostctl/exception.h"
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
 
 namespace TknCtl::Linux::Kernel {
 
@@ -126,6 +128,13 @@ std::string ResolvConfManager(const std::string& path) {
 }
 
 std::string ReadResolvConf(const std::string& path) {
+    if (DryRun()) {
+        // What a dry run would have written, at the file a link leads to.
+        char* real = realpath(path.c_str(), nullptr);
+        auto planned = PlannedFile(real ? std::string(real) : path);
+        std::free(real);
+        if (planned) return *planned;
+    }
     int fd = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
     if (fd < 0) {
         if (errno == ENOENT) return {};
@@ -162,6 +171,10 @@ void WriteResolvConf(const std::string& given, const std::string& text) {
     if (char* real = realpath(given.c_str(), nullptr)) {
         path = real;  // a link: its target is written, the link stays
         std::free(real);
+    }
+    if (DryRun()) {
+        Record(DescribeResolvConf(path, text));
+        return PlanFile(path, text);
     }
     auto slash = path.rfind('/');
     std::string dir = slash == 0 ? "/" : path.substr(0, slash);

@@ -7,6 +7,8 @@
 #include <cstring>
 
 #include "hostctl/exception.h"
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
 
 namespace TknCtl::Linux::Kernel {
 
@@ -36,6 +38,9 @@ int OpenIn(const Namespace& ns, const std::string& path, int flags) {
 }  // namespace
 
 std::optional<std::string> ReadSysctl(const Namespace& ns, const std::string& name) {
+    if (DryRun()) {
+        if (auto planned = PlannedSysctl(ns, name)) return planned;
+    }
     std::string path = PathOf(name);
     int fd = OpenIn(ns, path, O_RDONLY);
     if (fd < 0) {
@@ -62,6 +67,10 @@ std::optional<std::string> ReadSysctl(const Namespace& ns, const std::string& na
 }
 
 void WriteSysctl(const Namespace& ns, const std::string& name, const std::string& value) {
+    if (DryRun()) {
+        Record(DescribeSysctl(name, value), ns);
+        return PlanSysctl(ns, name, value);
+    }
     std::string path = PathOf(name);
     int fd = OpenIn(ns, path, O_WRONLY);
     if (fd < 0)

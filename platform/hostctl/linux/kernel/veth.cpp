@@ -14,6 +14,8 @@
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
 #include "kernel/request.h"
 
 namespace TknCtl::Linux::Kernel {
@@ -88,6 +90,12 @@ nl_msg* BuildVethAdd(const VethPair& pair, int peerNamespaceFd) {
 
 void AddVeth(const Namespace& ns, const VethPair& pair, const Namespace& peerNs) {
     const std::string what = "Cannot create veth pair " + pair.end.name + "/" + pair.peer.name;
+    if (DryRun()) {
+        // The peer's namespace may be one the dry run would make: no file of it is opened.
+        Record(DescribeVethAdd(pair, peerNs == ns ? std::string() : NetstackName(peerNs)), ns);
+        PlanVeth(ns, pair, peerNs);
+        return Changed();
+    }
     int fd = -1;
     if (!(peerNs == ns)) {
         fd = open(peerNs.Path().c_str(), O_RDONLY | O_CLOEXEC);

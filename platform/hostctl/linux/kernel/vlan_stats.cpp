@@ -12,6 +12,7 @@
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/dryrun.h"
 #include "kernel/ethtool.h"
 
 namespace TknCtl::Linux::Kernel {
@@ -99,6 +100,11 @@ std::vector<VlanCounters> ReadPortVlanStats(const Namespace& ns, int portIndex) 
 }
 
 void ChangeBridgeVlanStats(const Namespace& ns, int bridgeIndex, bool enabled) {
+    if (DryRun()) {
+        std::unique_ptr<nl_msg, decltype(&nlmsg_free)> request(
+            BuildBridgeVlanStatsChange(bridgeIndex, enabled), &nlmsg_free);
+        return RehearseRequest(ns, nlmsg_hdr(request.get()));
+    }
     Transact(RouteSocket(ns), BuildBridgeVlanStatsChange(bridgeIndex, enabled), [](nl_msg*) {});
 }
 

@@ -20,6 +20,8 @@
 #include <memory>
 
 #include "hostctl/exception.h"
+#include "kernel/describe.h"
+#include "kernel/dryrun.h"
 
 #ifndef SOL_NETLINK
 #define SOL_NETLINK 270
@@ -260,6 +262,7 @@ std::vector<XfrmState> ListStates(const Namespace& ns) {
     std::vector<XfrmState> states;
     for (nl_object* object = nl_cache_get_first(raw); object; object = nl_cache_get_next(object))
         states.push_back(StateFromObject(reinterpret_cast<xfrmnl_sa*>(object)));
+    if (DryRun()) ApplyXfrmPlans(ns, states);
     return states;
 }
 
@@ -369,6 +372,7 @@ std::vector<XfrmPolicy> ListPolicies(const Namespace& ns) {
     std::vector<XfrmPolicy> policies;
     for (nl_object* object = nl_cache_get_first(raw); object; object = nl_cache_get_next(object))
         policies.push_back(PolicyFromObject(reinterpret_cast<xfrmnl_sp*>(object)));
+    if (DryRun()) ApplyXfrmPlans(ns, policies);
     return policies;
 }
 
@@ -436,6 +440,13 @@ nl_msg* BuildPolicyDelete(const XfrmPolicy& policy) {
 
 std::optional<XfrmRefusal> Send(const Namespace& ns, nl_msg* request) {
     Msg owned(request);
+    if (DryRun()) {
+        const std::string what = DescribeXfrmRequest(request);
+        Record(what.empty() ? "xfrm request of type " + std::to_string(nlmsg_hdr(request)->nlmsg_type) : what,
+               ns);
+        PlanXfrmRequest(ns, request);
+        return std::nullopt;
+    }
     nl_sock* sock = Socket(kXfrmProtocol, ns);
     // The kernel's own words with a refusal ("Requested type not found").
     int one = 1;

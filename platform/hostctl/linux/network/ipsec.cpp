@@ -194,7 +194,9 @@ public:
         if (auto refusal = Kernel::Send(ns_, Kernel::BuildStateAdd(state)))
             throw HostCtlException(AddRefusal(sa, *refusal));
 
-        auto held = FindState(state.source, state.destination, state.spi);
+        // (A dry run added nothing to read back: the state is named as it was asked.)
+        auto held =
+            Kernel::DryRun() ? std::optional(state) : FindState(state.source, state.destination, state.spi);
         if (!held || !IsAssociation(*held) || held->mode != state.mode ||
             Kernel::EncryptionName(*held->encryption) != Impl::SA_ENCPT_ALG[sa.encryptionAlgorithm] ||
             Kernel::IntegrityName(*held->integrity) != Impl::SA_AUTH_ALG[sa.integrityAlgorithm]) {
@@ -324,7 +326,7 @@ public:
         if (auto refusal = Kernel::Send(ns_, Kernel::BuildPolicyAdd(policy)))
             throw HostCtlException(Refusal("Cannot add Security Policy '" + sp.spName + "': ", *refusal));
 
-        auto held = FindPolicy(s, policy.direction);
+        auto held = Kernel::DryRun() ? std::optional(policy) : FindPolicy(s, policy.direction);
         if (!held || held->action != policy.action || held->templates != policy.templates) {
             if (held) Kernel::Send(ns_, Kernel::BuildPolicyDelete(*held));
             throw HostCtlException("The kernel does not hold Security Policy '" + sp.spName +
@@ -388,14 +390,14 @@ private:
     void Delete(const Kernel::XfrmState& state, const std::string& head) {
         if (auto refusal = Kernel::Send(ns_, Kernel::BuildStateDelete(state)))
             throw HostCtlException(Refusal(head, *refusal));
-        if (FindState(state.source, state.destination, state.spi))
+        if (!Kernel::DryRun() && FindState(state.source, state.destination, state.spi))
             throw HostCtlException(head + "the kernel still holds it");
     }
 
     void DeletePolicy(const Kernel::XfrmPolicy& policy, const std::string& head) {
         if (auto refusal = Kernel::Send(ns_, Kernel::BuildPolicyDelete(policy)))
             throw HostCtlException(Refusal(head, *refusal));
-        if (FindPolicy(policy.selector, policy.direction))
+        if (!Kernel::DryRun() && FindPolicy(policy.selector, policy.direction))
             throw HostCtlException(head + "the kernel still holds it");
     }
 

@@ -283,7 +283,7 @@ public:
         if (entry.enabled) {
             RefuseWhileInUse(key, "removed");
             Kernel::DeleteNamedNamespace(key);
-            Check(!Kernel::NamedNamespaceExists(key),
+            Check(Kernel::DryRun() || !Kernel::NamedNamespaceExists(key),
                   "Network namespace " + key + " is still there after its removal");
             if (!Kernel::RemoveNamespaceFiles(key)) {
                 context_.Warn(std::string(Kernel::kNamespaceFiles) + "/" + key +
@@ -364,7 +364,7 @@ public:
         record.congestionControl = settings.congestionControl;
         record.ipv6Enabled = settings.ipv6Enabled;
         Kernel::DeleteNamedNamespace(key);
-        Check(!Kernel::NamedNamespaceExists(key),
+        Check(Kernel::DryRun() || !Kernel::NamedNamespaceExists(key),
               "Network namespace " + key + " is still there after its removal");
         records[key] = record;
         Store(records);
@@ -511,6 +511,7 @@ private:
     void Create(const std::string& key, const Backend::NetstackSettings& settings) {
         Kernel::AddNamedNamespace(key);
         auto ns = Kernel::Namespace::Named(key);
+        if (Kernel::DryRun()) return CreateDryRun(key, ns, settings);
         try {
             ApplyMaxConnections(ns, key, settings.maxConnections);
             if (ReadText(ns, kAlgorithm) != KernelAlgorithm(settings.congestionControl))
@@ -527,8 +528,31 @@ private:
         }
     }
 
+    // A dry run makes no namespace, so it cannot read what a new one starts with: each setting is
+    // listed as the real run writes it where it differs from that, and refused as the kernel
+    // would refuse it (an algorithm it bars in other namespaces, IPv6 it does not have).
+    void CreateDryRun(const std::string& key, const Kernel::Namespace& ns,
+                      const Backend::NetstackSettings& settings) {
+        try {
+            Kernel::WriteSysctl(ns, kSomaxconn, std::to_string(settings.maxConnections));
+            ApplyAlgorithm(ns, key, settings.congestionControl);
+            if (HasIpv6(Kernel::Namespace::Own())) {
+                Kernel::WriteSysctl(ns, kIpv6All, settings.ipv6Enabled ? "0" : "1");
+                Kernel::WriteSysctl(ns, kIpv6Default, settings.ipv6Enabled ? "0" : "1");
+            } else if (settings.ipv6Enabled) {
+                throw HostCtlException("IPv6 cannot be enabled in netstack instance " + Lib::Quote(key) +
+                                       ": the kernel has no IPv6 (net.ipv6 settings are missing)");
+            }
+        } catch (const HostCtlException&) {
+            Kernel::DeleteNamedNamespace(key);  // as the real run takes it away again
+            throw;
+        }
+        Kernel::MakeNamespaceFiles(key);
+    }
+
     void ApplyMaxConnections(const Kernel::Namespace& ns, const std::string& key, std::uint32_t value) {
         Kernel::WriteSysctl(ns, kSomaxconn, std::to_string(value));
+        if (Kernel::DryRun()) return;  // nothing written to read back, here and below
         std::uint32_t now = ReadNumber(ns, kSomaxconn);
         Check(now == value, "Netstack instance " + Lib::Quote(key) + " has " + std::to_string(now) +
                                 " as its maximum number of connections after " + std::to_string(value) +
@@ -537,6 +561,18 @@ private:
 
     void ApplyAlgorithm(const Kernel::Namespace& ns, const std::string& key, const std::string& algorithm) {
         std::string kernelName = KernelAlgorithm(algorithm);
+        if (Kernel::DryRun()) {
+            // The kernel would refuse an algorithm it does not offer, or one it bars in a
+            // namespace other than its first: refused here as it would be.
+            // (A namespace the dry run would make has the lists of the program's own.)
+            const auto from = Kernel::IsPlannedNamespace(ns) ? Kernel::Namespace::Own() : ns;
+            const std::string available = Kernel::ReadSysctl(from, kAvailable).value_or("");
+            const std::string allowed =
+                ns.IsOwn() ? available : Kernel::ReadSysctl(from, kAllowed).value_or("");
+            if (std::string why = AlgorithmRefusal(key, algorithm, allowed, available); !why.empty())
+                throw HostCtlException(why);
+            return Kernel::WriteSysctl(ns, kAlgorithm, kernelName);
+        }
         try {
             Kernel::WriteSysctl(ns, kAlgorithm, kernelName);
         } catch (const HostCtlException& refused) {
@@ -559,6 +595,7 @@ private:
         // "all" changes every interface there, "default" those to come.
         Kernel::WriteSysctl(ns, kIpv6All, enabled ? "0" : "1");
         Kernel::WriteSysctl(ns, kIpv6Default, enabled ? "0" : "1");
+        if (Kernel::DryRun()) return;
         Check(Ipv6On(ns) == enabled, std::string("IPv6 is still ") + (enabled ? "disabled" : "enabled") +
                                          " in netstack instance " + Lib::Quote(key) + " after it was " +
                                          (enabled ? "enabled" : "disabled"));

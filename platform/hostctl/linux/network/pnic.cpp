@@ -270,6 +270,7 @@ void LinuxNics::SetAdminUp(const std::string& name, bool up) {
     Kernel::LinkChange change;
     change.up = up;
     Kernel::ChangeLink(Own(), name, change);
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
     const auto now = Require(name);
     if (now.up != up)
         throw HostCtlException(name + " is still " + (now.up ? "up" : "down") + " after it was brought " +
@@ -438,6 +439,7 @@ void LinuxNics::SetPnicInfo(const std::string& name, const Net::PnicInfo& info) 
     }
 
     // The kernel's word on what it now holds.
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
     Net::PnicInfo now;
     GetPnicInfo(name, now);
     auto differs = [&](const std::string& what, const std::string& asked, const std::string& holds) {
@@ -486,6 +488,7 @@ void LinuxNics::SetSpeedDuplex(const std::string& name, std::uint32_t speed, std
         values[ETHTOOL_A_LINKMODES_DUPLEX] = duplex == Net::PNIC_DUPLEX_FULL ? DUPLEX_FULL : DUPLEX_HALF;
     }
     Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_LINKMODES_SET, name, values), name, what);
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
 
     // Read back: the negotiation mode always; a forced speed and duplex while there is a link
     // (without one drivers report neither).

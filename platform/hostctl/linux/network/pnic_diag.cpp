@@ -111,7 +111,8 @@ std::uint32_t LinuxNics::BeginEepromWrite(const std::string& name, std::int64_t 
     try {
         const std::uint32_t size = Kernel::ReadDriverInfo(name).eepromLength;
         if (size == 0) {
-            Kernel::WriteEeprom(name, 0, 0, {});
+            // The driver's own refusal says more; a dry run writes nothing, not even nothing.
+            if (!Kernel::DryRun()) Kernel::WriteEeprom(name, 0, 0, {});
             throw HostCtlException(name + " has no EEPROM (its driver reports a size of 0 bytes)");
         }
         return size;
@@ -130,7 +131,8 @@ void LinuxNics::WriteEeprom(const std::string& name, std::int64_t magic, std::in
     const auto at = static_cast<std::uint32_t>(offset);
     try {
         Kernel::WriteEeprom(name, static_cast<std::uint32_t>(magic), at, bytes);
-        if (Kernel::ReadEeprom(name, at, static_cast<std::uint32_t>(bytes.size())) != bytes) {
+        if (!Kernel::DryRun() &&
+            Kernel::ReadEeprom(name, at, static_cast<std::uint32_t>(bytes.size())) != bytes) {
             throw HostCtlException(EepromOf(name, size) + " does not hold the " +
                                    std::to_string(bytes.size()) + " bytes written at offset " +
                                    std::to_string(offset));

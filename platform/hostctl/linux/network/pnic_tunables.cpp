@@ -82,6 +82,7 @@ void LinuxNics::SetPauseParams(const std::string& name, const Net::PnicPausePara
                                     {ETHTOOL_A_PAUSE_RX, pause.rx},
                                     {ETHTOOL_A_PAUSE_TX, pause.tx}}),
            name, "the pause parameters");
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
     const auto now = Get(ETHTOOL_MSG_PAUSE_GET, name, "the pause parameters");
     const bool autoneg = now.Value(ETHTOOL_A_PAUSE_AUTONEG) != 0, rx = now.Value(ETHTOOL_A_PAUSE_RX) != 0,
                tx = now.Value(ETHTOOL_A_PAUSE_TX) != 0;
@@ -174,6 +175,7 @@ void LinuxNics::SetCoalesceParams(const std::string& name, const Net::PnicCoales
     context_.BeginChange();
     Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_COALESCE_SET, name, changes), name,
            "the coalesce parameters");
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
     const auto now = Get(ETHTOOL_MSG_COALESCE_GET, name, "the coalesce parameters");
     for (const auto& field : kCoalesce) {
         auto it = changes.find(field.attribute);
@@ -238,6 +240,7 @@ void LinuxNics::ChangeFeatures(const std::string& name,
     if (wanted.empty()) return;
     context_.BeginChange();
     Change(Kernel::BuildFeaturesSet(Ethtool().Family(), name, wanted), name, what);
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
     const auto now = Features(name);
     std::vector<std::string> kept;
     for (const auto& [feature, on] : wanted) {
@@ -323,6 +326,7 @@ void LinuxNics::SetRingParams(const std::string& name, const Net::PnicRingParams
     context_.BeginChange();
     Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_RINGS_SET, name, sizes), name,
            "the ring sizes");
+    if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
     const auto now = Get(ETHTOOL_MSG_RINGS_GET, name, "the ring sizes");
     static const std::pair<int, const char*> kNames[] = {{ETHTOOL_A_RINGS_RX, "RX"},
                                                          {ETHTOOL_A_RINGS_RX_MINI, "RX mini"},

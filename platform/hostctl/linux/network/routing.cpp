@@ -346,7 +346,8 @@ private:
         route.scope = RT_SCOPE_UNIVERSE;
         context_.BeginChange();
         Kernel::AddRoute(view.Namespace(), route);
-        if (!Holds(view, route)) {
+        // (A dry run changed nothing to read back.)
+        if (!Kernel::DryRun() && !Holds(view, route)) {
             throw HostCtlException("The kernel does not hold the route " + Kernel::DescribeRoute(route) +
                                    " after adding it");
         }
@@ -360,7 +361,7 @@ private:
         route.metric = metric;
         context_.BeginChange();
         Kernel::DeleteRoute(view.Namespace(), route);
-        if (Holds(view, route)) {
+        if (!Kernel::DryRun() && Holds(view, route)) {
             throw HostCtlException("The kernel still holds the route " + Kernel::DescribeRoute(route) +
                                    " after removing it");
         }
@@ -434,6 +435,7 @@ private:
         context_.BeginChange();
         for (const auto& [entry, name] : matches)
             Kernel::DeleteNeighbour(view.Namespace(), entry, name);
+        if (Kernel::DryRun()) return;
         // Traffic may ask for the address again at once: an entry still resolving is no leftover.
         for (const auto& entry : view.Neighbours(family)) {
             if (entry.address != address || (only != 0 && entry.index != only)) continue;

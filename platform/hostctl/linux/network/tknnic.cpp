@@ -50,6 +50,7 @@
 #include "hostctl/exception.h"
 #include "hostctl/network/vswitch.h"
 #include "kernel/bridges.h"
+#include "kernel/dryrun.h"
 #include "kernel/request.h"
 #include "kernel/sysctl.h"
 #include "kernel/veth.h"
@@ -199,6 +200,8 @@ public:
         Kernel::LinkChange change;
         change.up = enabled;
         Kernel::ChangeLink(View(id).Namespace(), id.name, change);
+        // (A dry run changed nothing to read back, here and after every change below.)
+        if (Kernel::DryRun()) return;
         if (Require(id).up != enabled) Differs(id, std::string("it is still ") + (enabled ? "down" : "up"));
     }
 
@@ -208,6 +211,7 @@ public:
         Kernel::LinkChange change;
         change.mtu = static_cast<unsigned>(mtu);
         Kernel::ChangeLink(View(id).Namespace(), id.name, change);
+        if (Kernel::DryRun()) return;
         unsigned now = Require(id).mtu;
         if (now != static_cast<unsigned>(mtu)) Differs(id, "its MTU is " + std::to_string(now));
     }
@@ -265,7 +269,7 @@ public:
         context_.BeginChange();
         ApplyIpv4(id, wanted);
         ApplyIpv6(id, current, wanted);
-        ReadBack(id, current, wanted);
+        if (!Kernel::DryRun()) ReadBack(id, current, wanted);
     }
 
     std::string InterfaceWithAddress(const std::string& netstack,
@@ -407,7 +411,7 @@ public:
             Kernel::ChangeLink(target.Namespace(), chosen, up);
             Kernel::ChangeLink(Kernel::Namespace::Own(), end, up);
             switches_.ConnectPort(group, end);
-            CheckMade(id, pair, group);
+            if (!Kernel::DryRun()) CheckMade(id, pair, group);
         } catch (...) {
             TakeAway(id, end);
             throw;
@@ -429,7 +433,8 @@ public:
         const auto own = Kernel::Namespace::Own();
         Kernel::DeleteLink(own, end->index, end->name);
         Kernel::Changed();
-        if (views_.Of(Context::kDefaultNetstack).LinkByName(end->name) || View(id).LinkByName(id.name))
+        if (!Kernel::DryRun() &&
+            (views_.Of(Context::kDefaultNetstack).LinkByName(end->name) || View(id).LinkByName(id.name)))
             Differs(id, "it is still there after its removal");
         ForgetDocumented(id);
     }

@@ -514,7 +514,9 @@ void LinuxSwitches::Add(const std::string& name, std::uint32_t numPorts,
         Kernel::ChangeLink(own, name, Up());
         view = Look();
         const auto* bridge = view.Find(name);
-        if (!bridge || !bridge->bridge || !bridge->up)
+        // (A dry run changed nothing to read back, here and after the changes below; the view
+        // shows what it would have done to links.)
+        if (!Kernel::DryRun() && (!bridge || !bridge->bridge || !bridge->up))
             throw HostCtlException("Bridge " + name + " is not there, up, after it was made");
     } catch (...) {
         const auto after = Look();
@@ -565,7 +567,7 @@ void LinuxSwitches::Remove(const std::string& name) {
     }
     Kernel::DeleteLink(own, bridge.index, name);
     view = Look();
-    if (const auto* still = view.Find(name); still && still->bridge)
+    if (const auto* still = view.Find(name); still && still->bridge && !Kernel::DryRun())
         throw HostCtlException("Bridge " + name + " is still there after its removal");
     Store(Records(), view);
 }
@@ -618,7 +620,7 @@ void LinuxSwitches::SetMtu(const std::string& name, int mtu) {
     for (const auto* port : view.PortsOf(after)) {
         if (carries(*port) && port->mtu != wanted) differs = port->name;
     }
-    if (!differs.empty()) {
+    if (!differs.empty() && !Kernel::DryRun()) {
         throw HostCtlException("The MTU of " + differs + " is not " + std::to_string(mtu) +
                                " after the MTU of virtual switch " + name + " was set");
     }
@@ -695,9 +697,9 @@ void LinuxSwitches::AddUplink(const std::string& name, const std::string& nic) {
         view = Look();
         const auto& joined = Bridge(view, name);
         const auto* port = view.Find(nic);
-        if (!port || port->master != joined.index || !port->port)
+        if (!Kernel::DryRun() && (!port || port->master != joined.index || !port->port))
             throw HostCtlException(nic + " is not a port of bridge " + name + " after it was added");
-        if (port->mtu != joined.mtu)
+        if (!Kernel::DryRun() && port->mtu != joined.mtu)
             throw HostCtlException("The MTU of " + nic + " is not the switch's after it was added");
         ApplyShaping(view, joined, record, nic);
         ApplyVlans(view, joined, record);
@@ -738,7 +740,7 @@ void LinuxSwitches::RemoveUplink(const std::string& name, const std::string& nic
     }
     Kernel::ChangeLink(own, nic, Master(0));
     view = Look();
-    if (const auto* after = view.Find(nic); after && after->master != 0)
+    if (const auto* after = view.Find(nic); after && after->master != 0 && !Kernel::DryRun())
         throw HostCtlException(nic + " is still a port of bridge " + name + " after its removal");
     Store(Records(), view);
 }

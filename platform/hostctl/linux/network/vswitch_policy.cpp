@@ -202,6 +202,17 @@ const PortGroupRecord* LinuxSwitches::GroupOfPort(const SwitchRecord& record, co
 
 std::optional<std::string> LinuxSwitches::ClientMac(const View& view, const Kernel::BridgeLink& port) const {
     if (port.kind != "veth" || port.peer == 0) return std::nullopt;
+    // An end a dry run would make: its peer's address is the one asked for, else the kernel's
+    // choice, which only the real run learns.
+    if (const auto* plan = Kernel::FindLinkPlan(Kernel::Namespace::Own(), port.index); plan && plan->made) {
+        for (const auto& peer : Kernel::LinkPlans()) {
+            if (peer.ns != plan->peerNs || peer.index != plan->peer) continue;
+            if (!peer.mac.empty()) return peer.mac;
+            Kernel::StopDryRun("read the MAC address the kernel gives " + peer.name +
+                               " and carry out the security policy on " + port.name +
+                               " with it (a static forwarding entry of that address, then the port flags)");
+        }
+    }
     if (!port.peerNamespaceId) {
         const auto* peer = view.ByIndex(port.peer);
         return peer && !peer->mac.empty() ? std::optional<std::string>(peer->mac) : std::nullopt;
@@ -268,6 +279,7 @@ void LinuxSwitches::ApplySecurity(const View& view, const Kernel::BridgeLink& br
         if (plan.mac) Kernel::ChangeStaticEntry(own, plan.port->index, plan.port->name, *plan.mac, true);
         Kernel::ChangePortFlags(own, plan.port->index, plan.port->name, plan.change);
     }
+    if (Kernel::DryRun()) return;  // nothing changed to read back
     const auto after = Look();
     const auto entries = Kernel::ListForwardingEntries(own);
     for (const auto& plan : plans) {
@@ -333,7 +345,7 @@ void LinuxSwitches::ApplyShaping(const View& view, const Kernel::BridgeLink& bri
             Kernel::DeleteRootQdisc(own, plan.port->index, plan.port->name);
         }
     }
-    if (plans.empty()) return;
+    if (plans.empty() || Kernel::DryRun()) return;  // a dry run changed nothing to read back
     const auto after = Kernel::ListRootQdiscs(own);
     for (const auto& plan : plans) {
         const Kernel::RootQdisc* root = nullptr;

@@ -152,6 +152,7 @@ void LinuxSwitches::ConnectPort(const std::string& portGroup, const std::string&
         view = Look();
         const auto& after = Bridge(view, vswitch);
         const auto* member = view.Find(port);
+        // (A dry run's view shows the port joined, as the real run would leave it.)
         if (!member || member->master != after.index || !member->port)
             throw HostCtlException(port + " is not a port of bridge " + vswitch + " after it was connected");
         ApplySecurity(view, after, record, port);
@@ -200,7 +201,7 @@ void LinuxSwitches::DisconnectPort(const std::string& port) {
         leave.master = 0;
         Kernel::ChangeLink(own, port, leave);
         view = Look();
-        if (const auto* after = view.Find(port); after && after->master != 0)
+        if (const auto* after = view.Find(port); after && after->master != 0 && !Kernel::DryRun())
             throw HostCtlException(port + " is still a port of bridge " + vswitch +
                                    " after it was disconnected");
     }
@@ -256,6 +257,7 @@ void LinuxSwitches::ApplyVlans(const View& view, const Kernel::BridgeLink& bridg
         Kernel::ChangePortVlans(own, port->index, port->name, vlansOf(port->index), false);
         Kernel::ChangePortVlans(own, port->index, port->name, vlans, true);
     }
+    if (Kernel::DryRun()) return;  // nothing changed to read back
     const auto after = Kernel::ListPortVlans(own);
     for (const auto& [port, vlans] : plans) {
         std::vector<Kernel::PortVlan> got;

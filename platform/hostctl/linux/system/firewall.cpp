@@ -143,7 +143,8 @@ public:
             Kernel::NftFirewall wanted = ToKernel(state);
             if (!current || !Kernel::Difference(wanted, *current).empty()) {
                 Kernel::WriteFirewall(wanted);
-                auto held = Kernel::ReadFirewall();
+                // (A dry run wrote nothing to read back: the kernel checked the table.)
+                auto held = Kernel::DryRun() ? std::optional(wanted) : Kernel::ReadFirewall();
                 std::string difference = held ? Kernel::Difference(wanted, *held) : "it is not there";
                 if (!difference.empty()) {
                     Restore(current);
@@ -154,7 +155,7 @@ public:
             }
         } else if (current) {
             Kernel::DeleteFirewall();
-            if (Kernel::ReadFirewall())
+            if (!Kernel::DryRun() && Kernel::ReadFirewall())
                 throw HostCtlException(
                     "The firewall's nftables table inet hadro is still there after it was deleted");
         }

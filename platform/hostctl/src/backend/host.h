@@ -21,6 +21,7 @@
 // simulated host loads nothing of it.
 #pragma once
 
+#include <functional>
 #include <string>
 
 namespace TknCtl::Backend {
@@ -33,6 +34,11 @@ class Ipsec;       // ipsec.h: security associations and policies
 class Firewall;    // firewall.h: the host firewall
 class Nics;        // nics.h: physical NICs
 class Switches;    // switches.h: virtual switches, port groups and their policies
+
+// Where a real host's dry run reports each kernel request it would make, as one line. last
+// marks the line that ends the dry run early (what the real run would do next): whatever is
+// reported after it, while the program unwinds, is dropped.
+using DryRunRecorder = std::function<void(const std::string& line, bool last)>;
 
 class Host {
 public:
@@ -58,6 +64,10 @@ public:
     virtual void Discard() = 0;
     // True when Commit would store something.
     virtual bool HasChanges() const = 0;
+    // From now on the host changes nothing: each kernel request is reported to record instead
+    // of being made (reads still reach the kernel), the host's own document is never written
+    // (Commit keeps its changes in memory), and a check that reads back a change is left out.
+    virtual void StartDryRun(DryRunRecorder record) = 0;
 };
 
 }  // namespace TknCtl::Backend

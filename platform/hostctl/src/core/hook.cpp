@@ -11,18 +11,23 @@ namespace TknCtl::Lib {
 std::optional<std::string> TryEnter(std::string_view operation, std::string_view target,
                                     std::string_view arguments) {
     RequireSession();
+    auto line = [&] {
+        std::string text(operation);
+        for (std::string_view part : {target, arguments}) {
+            if (part.empty()) continue;
+            text += ' ';
+            text += part;
+        }
+        return text;
+    };
+    // A dry run lists the calls on either host, and leaves the journal as it is.
+    const bool dryRun = DryRun();
+    if (dryRun) RecordDryRun(line());
     // Faults and the journal belong to the simulated host's state file.
     if (RealHost()) return std::nullopt;
 
-    if (Read<Model::JournalSection>().enabled) {
-        std::string line(operation);
-        for (std::string_view part : {target, arguments}) {
-            if (part.empty()) continue;
-            line += ' ';
-            line += part;
-        }
-        Write<Model::JournalSection>().lines.push_back(std::move(line));
-    }
+    if (!dryRun && Read<Model::JournalSection>().enabled)
+        Write<Model::JournalSection>().lines.push_back(line());
 
     const auto& faults = Read<Model::FaultsSection>().faults;
     for (std::size_t i = 0; i < faults.size(); ++i) {

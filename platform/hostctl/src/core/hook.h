@@ -28,6 +28,12 @@ void Enter(std::string_view operation, std::string_view target = {}, std::string
 std::optional<std::string> TryEnter(std::string_view operation, std::string_view target = {},
                                     std::string_view arguments = {});
 
+// Whether the current session is a dry run (HostSession::StartDryRun), and the recording of
+// its lines: a call as the journal words it, or a real host's kernel request. last ends the
+// recording until the lines are next taken (the dry run went as far as it could).
+bool DryRun();
+void RecordDryRun(std::string line, bool last = false);
+
 namespace Detail {
 inline std::string ArgText(std::string_view value) {
     return std::string(value);

@@ -21,6 +21,7 @@
 
 #include "core/backend.h"
 #include "core/embedded.h"
+#include "core/hook.h"
 #include "core/store.h"
 #include "core/text.h"
 #include "hostctl/exception.h"
@@ -33,6 +34,9 @@ using TknCtl::Lib::Store;
 StateFileError::StateFileError(std::string message) : message_(Printable(message)) {}
 StateFileError::~StateFileError() = default;
 
+DryRunEnd::DryRunEnd(std::string next) : next_(std::move(next)) {}
+DryRunEnd::~DryRunEnd() = default;
+
 namespace {
 
 // A state file larger than this is refused rather than read into memory.
@@ -41,6 +45,19 @@ constexpr off_t kMaxStateSize = 256 * 1024 * 1024;
 HostSession* g_current = nullptr;
 Store* g_store = nullptr;                     // the current session's document (simulated host)
 TknCtl::Backend::Host* g_realHost = nullptr;  // the current session's real host
+
+// What a dry run recorded (HostSession::StartDryRun).
+struct DryRunLog {
+    std::vector<std::string> lines;
+    bool stopped = false;  // the dry run went as far as it could: nothing more is recorded
+
+    void Record(std::string line, bool last) {
+        if (stopped) return;
+        lines.push_back(std::move(line));
+        stopped = last;
+    }
+};
+DryRunLog* g_dryRun = nullptr;  // the current session's, while it is a dry run
 
 [[noreturn]] void NotOnRealHost(const char* what) {
     throw StateFileError(std::string(what) + " concerns the simulated host's state file, not the " +
@@ -229,6 +246,7 @@ struct HostSession::Impl {
     bool mustWrite = false;  // the file does not exist yet
     bool existed = false;
     mode_t mode = 0600;
+    std::unique_ptr<DryRunLog> dryRun;  // set once the session is a dry run
 
     ~Impl() {
         if (lockFd >= 0) close(lockFd);  // releases the lock
@@ -249,6 +267,7 @@ HostSession::~HostSession() {
         g_current = nullptr;
         g_store = nullptr;
         g_realHost = nullptr;
+        g_dryRun = nullptr;
     }
 }
 
@@ -431,7 +450,9 @@ void HostSession::Commit() {
     Store::Snapshot snapshot = impl_->store->TakeSnapshot();
     if (!impl_->mustWrite && !impl_->store->Differs(snapshot)) return;
     impl_->store->AddDigests(snapshot);
-    if (!impl_->path.empty()) impl_->WriteFile(snapshot.pieces);
+    // A dry run commits in memory only, as a session held in memory does: what a command
+    // changed is seen by the next command of a batch, and never reaches the file.
+    if (!impl_->path.empty() && !impl_->dryRun) impl_->WriteFile(snapshot.pieces);
     impl_->mustWrite = false;
     impl_->store->Committed(std::move(snapshot));
 }
@@ -466,6 +487,28 @@ void HostSession::Reset() {
     Replace(DefaultDocument(), "the default host");
 }
 
+void HostSession::StartDryRun() {
+    if (impl_->dryRun) return;
+    impl_->dryRun = std::make_unique<DryRunLog>();
+    if (g_current == this) g_dryRun = impl_->dryRun.get();
+    if (impl_->realHost) {
+        DryRunLog* log = impl_->dryRun.get();
+        impl_->realHost->StartDryRun([log](const std::string& line, bool last) { log->Record(line, last); });
+    }
+}
+
+bool HostSession::IsDryRun() const {
+    return impl_->dryRun != nullptr;
+}
+
+std::vector<std::string> HostSession::TakeDryRunLines() {
+    std::vector<std::string> lines;
+    if (!impl_->dryRun) return lines;
+    lines.swap(impl_->dryRun->lines);
+    impl_->dryRun->stopped = false;
+    return lines;
+}
+
 const std::string& HostSession::GetPath() const {
     return impl_->path;
 }
@@ -496,6 +539,14 @@ void RequireSession() {
 
 Backend::Host* RealHost() {
     return HostCtl::Lib::g_realHost;
+}
+
+bool DryRun() {
+    return HostCtl::Lib::g_dryRun != nullptr;
+}
+
+void RecordDryRun(std::string line, bool last) {
+    if (auto* log = HostCtl::Lib::g_dryRun) log->Record(std::move(line), last);
 }
 
 }  // namespace TknCtl::Lib

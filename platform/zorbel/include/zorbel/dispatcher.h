@@ -33,6 +33,7 @@ struct GlobalOptions {
     bool version = false;
     std::string batch;    // --batch FILE ("-": standard input); empty: not given
     bool atomic = false;  // --atomic: the whole batch is one transaction
+    bool dryRun = false;  // --dry-run: the command changes nothing and lists the calls it would make
     std::vector<std::pair<std::string, std::string>> formatParameters;
     std::string manual;      // --manual ("man") or --manual=markdown; empty: not asked
     std::string completion;  // --completion=bash|zsh; empty: not asked

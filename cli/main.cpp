@@ -17,6 +17,7 @@
 #include <string>
 #include <vector>
 
+#include "hostctl/exception.h"
 #include "hostctl/session.h"
 #include "zorbel/checked_output.h"
 #include "zorbel/dispatcher.h"
@@ -183,6 +184,20 @@ void WriteDryRunLines(HostCtl::Lib::HostSession& session, std::ostream& out) {
         out << Zorbel::Format::TerminalSafe(line) << '\n';
 }
 
+// --confirm-within and --atomic: the session's changes roll back by themselves (unless
+// confirmed) / when the batch fails. False, with one line on stderr, when the host cannot see to
+// it (its watcher cannot be started): then nothing runs.
+bool GuardChanges(HostCtl::Lib::HostSession& session, const GlobalOptions& options) {
+    try {
+        if (options.confirmWithin) session.ConfirmWithin(options.confirmWithin);
+        if (options.atomic && !options.dryRun) session.BeginAtomic();
+        return true;
+    } catch (const HostCtl::Lib::HostCtlException& e) {
+        std::cerr << "Error: " << Zorbel::Format::TerminalSafe(e.what()) << '\n';
+        return false;
+    }
+}
+
 // Runs the command as one transaction on the host state: the session is opened only now
 // that a command is really going to run (help, listings and refusals never touch the
 // state), and committed when the command ran to its end (status 0 or 1). An exception that
@@ -201,6 +216,7 @@ int RunInSession(Dispatcher& dispatcher, const Zorbel::AutoCli::Invocation& invo
     std::unique_ptr<HostSession> session;
     try {
         session = OpenSession(options);
+        if (!GuardChanges(*session, options)) return Zorbel::AutoCli::EXIT_UNEXPECTED;
         if (options.dryRun) session->StartDryRun();
         dispatcher.KeepLastResult(true);
         status = ExecuteCommand(dispatcher, invocation, options, out, err);
@@ -276,6 +292,20 @@ bool SplitBatchLine(const std::string& line, std::vector<std::string>& words, st
     return true;
 }
 
+// An atomic batch that does not succeed: a real host takes back the kernel changes of its
+// earlier lines (the simulated host never wrote them). False, with the reason on stderr, when
+// the host could not be brought back.
+bool UndoBatch(HostCtl::Lib::HostSession* session) {
+    if (!session) return true;
+    try {
+        session->EndAtomic(false);
+        return true;
+    } catch (const std::exception& e) {
+        std::cerr << "Error: " << Zorbel::Format::TerminalSafe(e.what()) << '\n';
+        return false;
+    }
+}
+
 // Runs the command lines of a batch (a file, or standard input for "-") in one process and
 // one session. Each line is what would follow hadrocli's global options; a line may set its
 // own --formatter and --format-param. Without --atomic every line is a transaction of its
@@ -328,7 +358,7 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             err << "Error: " << error << '\n';
             status = Zorbel::AutoCli::EXIT_REFUSED;
         } else if (!own.statePath.empty() || !own.pluginDirs.empty() || !own.batch.empty() || own.atomic ||
-                   !own.backend.empty() || own.dryRun) {
+                   !own.backend.empty() || own.dryRun || own.confirmWithin || own.confirm || own.rollback) {
             err << "Error: only --formatter and --format-param may stand before the words of a batch line\n";
             status = Zorbel::AutoCli::EXIT_REFUSED;
         } else {
@@ -350,6 +380,11 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
                 try {
                     if (!session) {
                         session = OpenSession(options);
+                        if (!GuardChanges(*session, options)) {
+                            std::cerr << "line " << number << ": " << Zorbel::Format::TerminalSafe(line)
+                                      << '\n';
+                            return Zorbel::AutoCli::EXIT_UNEXPECTED;
+                        }
                         if (options.dryRun) session->StartDryRun();
                     }
                     status = ExecuteCommand(dispatcher, prepared.invocation, lineOptions, out, err);
@@ -368,6 +403,7 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
                     // The state cannot be used: no later line could run either.
                     std::cerr << "Error: " << e.what() << '\n'
                               << "line " << number << ": " << Zorbel::Format::TerminalSafe(line) << '\n';
+                    if (options.atomic) UndoBatch(session.get());
                     return Zorbel::AutoCli::EXIT_UNEXPECTED;
                 }
             }
@@ -376,9 +412,10 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             err << "line " << number << ": " << Zorbel::Format::TerminalSafe(line) << '\n';
             if (options.atomic) {
                 // Nothing of the batch took effect: its output would describe changes that
-                // never happened. The session closes without writing.
+                // never happened. The session closes without writing, and a real host takes
+                // back what the earlier lines changed.
                 std::cerr << err.str();
-                return status;
+                return UndoBatch(session.get()) ? status : Zorbel::AutoCli::EXIT_UNEXPECTED;
             }
             if (first == Zorbel::AutoCli::EXIT_OK) first = status;
         }
@@ -397,6 +434,7 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
         std::cerr << "Error: batch "
                   << (interactive ? "from standard input" : Zorbel::Format::TerminalSafe(options.batch))
                   << ": cannot read\n";
+        if (options.atomic) UndoBatch(session.get());
         return Zorbel::AutoCli::EXIT_UNEXPECTED;
     }
     if (options.atomic && session) {
@@ -404,12 +442,41 @@ int RunBatch(Dispatcher& dispatcher, const GlobalOptions& options) {
             session->Commit();
         } catch (const StateFileError& e) {
             std::cerr << "Error: " << e.what() << '\n';
+            UndoBatch(session.get());
+            return Zorbel::AutoCli::EXIT_UNEXPECTED;
+        }
+        try {
+            session->EndAtomic(true);
+        } catch (const std::exception& e) {
+            // The batch is committed; only its checkpoint could not be dropped.
+            std::cerr << "Error: " << Zorbel::Format::TerminalSafe(e.what()) << '\n';
+            std::cout << heldOut;
             return Zorbel::AutoCli::EXIT_UNEXPECTED;
         }
     }
     std::cout << heldOut;
     std::cerr << heldErr;
     return first;
+}
+
+// --confirm and --rollback: the pending checkpoint of the Linux host is kept or restored; no
+// command runs.
+int SettleCheckpoint(const GlobalOptions& options) {
+    try {
+        auto session = OpenSession(options);
+        if (options.confirm) {
+            session->ConfirmCheckpoint();
+        } else {
+            session->RollbackCheckpoint();
+        }
+    } catch (const HostCtl::Lib::StateFileError& e) {
+        std::cerr << "Error: " << e.what() << '\n';
+        return Zorbel::AutoCli::EXIT_UNEXPECTED;
+    } catch (const HostCtl::Lib::HostCtlException& e) {
+        std::cerr << "Error: " << Zorbel::Format::TerminalSafe(e.what()) << '\n';
+        return Zorbel::AutoCli::EXIT_FAILED;
+    }
+    return Zorbel::AutoCli::EXIT_OK;
 }
 
 int Main(int argc, char** argv) {
@@ -424,11 +491,30 @@ int Main(int argc, char** argv) {
         return Zorbel::AutoCli::EXIT_REFUSED;
     }
 
+    const char* settle = options.confirm ? "--confirm" : options.rollback ? "--rollback" : nullptr;
     try {
-        if (HostCtl::Lib::ResolveBackend(options.backend) == HostCtl::Lib::BackendKind::kLinux &&
-            !options.statePath.empty()) {
+        const bool onLinux =
+            HostCtl::Lib::ResolveBackend(options.backend) == HostCtl::Lib::BackendKind::kLinux;
+        if (onLinux && !options.statePath.empty()) {
             error =
                 "option --state names the simulated host's state file; it does not go with --backend=linux";
+        } else if (!onLinux && (options.confirmWithin || settle)) {
+            error = std::string("option ") + (settle ? settle : "--confirm-within") +
+                    " is for the Linux host (--backend=linux): the simulated host keeps no checkpoints";
+        } else if (options.dryRun && (options.confirmWithin || settle)) {
+            error = std::string("option --dry-run changes nothing: it cannot be combined with ") +
+                    (settle ? settle : "--confirm-within");
+        } else if (options.confirm && options.rollback) {
+            error = "options --confirm and --rollback cannot be combined";
+        } else if (settle && (options.confirmWithin || !options.batch.empty() || options.atomic ||
+                              options.help || options.version || options.listCommands ||
+                              !options.manual.empty() || !options.completion.empty())) {
+            error = std::string("option ") + settle +
+                    " cannot be combined with --confirm-within, --batch, --atomic, --help, --version, "
+                    "--list-commands, --manual or --completion";
+        } else if (settle && !rest.empty()) {
+            error = std::string("option ") + settle + " runs no command; '" +
+                    Zorbel::Format::TerminalSafe(rest.front()) + "' cannot follow it";
         }
     } catch (const std::invalid_argument& e) {
         error = Zorbel::Format::TerminalSafe(e.what());
@@ -453,6 +539,8 @@ int Main(int argc, char** argv) {
                   << "\nUsage: hadrocli [global options] --batch FILE|-; see 'hadrocli --help'.\n";
         return Zorbel::AutoCli::EXIT_REFUSED;
     }
+
+    if (settle) return SettleCheckpoint(options);
 
     auto dispatcher = Dispatcher::New("hadrocli");
     dispatcher->LoadPluginDirectories(PluginDirectories(options), std::cerr);

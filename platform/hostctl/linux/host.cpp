@@ -8,6 +8,7 @@
 #include "backend/nics.h"
 #include "backend/routing.h"
 #include "backend/switches.h"
+#include "core/checkpoint.h"
 #include "core/context.h"
 #include "network/areas.h"
 
@@ -36,9 +37,17 @@ public:
     bool HasChanges() const override { return context_->HasChanges(); }
     void StartDryRun(Backend::DryRunRecorder record) override { context_->StartDryRun(std::move(record)); }
 
+    void ConfirmWithin(unsigned seconds) override { context_->GetCheckpoints().ConfirmWithin(seconds); }
+    void BeginAtomic() override { context_->GetCheckpoints().BeginAtomic(); }
+    void EndAtomic(bool keep) override { context_->GetCheckpoints().EndAtomic(keep); }
+    void ConfirmCheckpoint() override { context_->GetCheckpoints().Confirm(); }
+    void RollbackCheckpoint() override { context_->GetCheckpoints().Rollback(); }
+
 private:
     template <class T>
     T& Area(std::unique_ptr<T>& area, std::unique_ptr<T> (*make)(Context&)) {
+        // A command that reaches the host hears first of a checkpoint nobody will restore.
+        context_->GetCheckpoints().ReportStale();
         if (!area) area = make(*context_);
         return *area;
     }

@@ -208,7 +208,7 @@ std::string Data(const Tables& tables, const std::string& declare, const std::st
 // forms. @ID@ is the program name as an identifier, @PROG@ the program.
 const char* const kBash = R"BASH(
 # The global options that take a value, given as the next word or after '='.
-_@ID@_global_options=$'--formatter\n--format-param\n--backend\n--state\n--plugin-dir\n--batch\n--atomic\n--dry-run\n--list-commands\n--manual\n--completion\n--help\n--version'
+_@ID@_global_options=$'--formatter\n--format-param\n--backend\n--state\n--plugin-dir\n--batch\n--atomic\n--dry-run\n--confirm-within\n--confirm\n--rollback\n--list-commands\n--manual\n--completion\n--help\n--version'
 
 # Adds the candidates that start with the typed text ($2) to COMPREPLY, after $1 (the part of
 # the word readline replaces ahead of the value). Names with blanks or quotes are escaped
@@ -307,7 +307,7 @@ _@ID@() {
         w=${words[i]}
         case $w in
             --state|--plugin-dir|--backend) _@ID@_globals+=("$w=${words[i + 1]}"); i=$((i + 2)); continue ;;
-            --formatter|--format-param|--completion|--batch) i=$((i + 2)); continue ;;
+            --formatter|--format-param|--completion|--batch|--confirm-within) i=$((i + 2)); continue ;;
             --state=*|--plugin-dir=*|--backend=*) _@ID@_globals+=("$w") ;;
             -*) ;;
             *) break ;;
@@ -408,7 +408,7 @@ complete -F _@ID@ @PROG@
 )BASH";
 
 const char* const kZsh = R"ZSH(
-_@ID@_global_options=$'--formatter\n--format-param\n--backend\n--state\n--plugin-dir\n--batch\n--atomic\n--dry-run\n--list-commands\n--manual\n--completion\n--help\n--version'
+_@ID@_global_options=$'--formatter\n--format-param\n--backend\n--state\n--plugin-dir\n--batch\n--atomic\n--dry-run\n--confirm-within\n--confirm\n--rollback\n--list-commands\n--manual\n--completion\n--help\n--version'
 
 # The names of one kind from the host, asked of the program with the global options of the
 # line (--backend, --state, --plugin-dir): one keyvalue line per name, escapes undone.
@@ -474,7 +474,7 @@ _@ID@() {
         w=${words[i]}
         case $w in
             --state|--plugin-dir|--backend) _@ID@_globals+=("$w=${words[i + 1]}"); i=$((i + 2)); continue ;;
-            --formatter|--format-param|--completion|--batch) i=$((i + 2)); continue ;;
+            --formatter|--format-param|--completion|--batch|--confirm-within) i=$((i + 2)); continue ;;
             --state=*|--plugin-dir=*|--backend=*) _@ID@_globals+=("$w") ;;
             -*) ;;
             *) break ;;

@@ -118,6 +118,21 @@ bool ParseGlobalOptions(const std::vector<std::string>& args, GlobalOptions& opt
             options.atomic = true;
         } else if (arg == "--dry-run") {
             options.dryRun = true;
+        } else if (TakeGlobalValue(args, i, "confirm-within", value, error)) {
+            if (!error.empty()) return false;
+            unsigned seconds = 0;
+            auto [end, fault] = std::from_chars(value.data(), value.data() + value.size(), seconds);
+            if (value.empty() || fault != std::errc() || end != value.data() + value.size() || seconds < 1 ||
+                seconds > kMaxConfirmWithin) {
+                error = "option --confirm-within needs a number of seconds from 1 to " +
+                        std::to_string(kMaxConfirmWithin) + ", got '" + Options::Shown(value) + "'";
+                return false;
+            }
+            options.confirmWithin = seconds;
+        } else if (arg == "--confirm") {
+            options.confirm = true;
+        } else if (arg == "--rollback") {
+            options.rollback = true;
         } else if (arg == "--manual") {
             options.manual = "man";
         } else if (StartsWith(arg, "--manual=")) {

@@ -250,6 +250,11 @@ std::vector<std::pair<std::string, std::string>> GlobalOptionRows() {
         {"--dry-run",
          "Check the command and list the host-control calls it would make (on a Linux host also each "
          "kernel request) instead of its result; nothing is changed."},
+        {"--confirm-within=SECONDS",
+         "Linux host: a checkpoint is taken before the change, and restored by itself after SECONDS (1 to "
+         "86400) unless --confirm runs first."},
+        {"--confirm", "Linux host: keep the changes made since the pending checkpoint."},
+        {"--rollback", "Linux host: restore the pending checkpoint now."},
         {"--manual[=markdown]",
          "Write the manual page (troff) of every command; with =markdown, the command reference in "
          "Markdown."},

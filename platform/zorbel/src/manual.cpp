@@ -185,7 +185,9 @@ std::string ManPage(const std::string& program, NamespaceNode& root) {
     out +=
         ".SH FILES\n"
         ".TP\n.I $XDG_STATE_HOME/hadro/host.json\nthe default host state file "
-        "(\\fI~/.local/state/hadro/host.json\\fR when XDG_STATE_HOME is not set)\n";
+        "(\\fI~/.local/state/hadro/host.json\\fR when XDG_STATE_HOME is not set)\n"
+        ".TP\n.I /var/lib/hadro/linux.json.checkpoint/\nthe Linux host's pending checkpoint, beside its "
+        "document: what \\fB\\-\\-rollback\\fR restores\n";
     return out;
 }
 

@@ -193,7 +193,8 @@ bool ParseCommandOptions(const std::vector<std::string>& args, const CallSpec::I
             if (!parameter) {
                 error = "unknown option --" + Shown(name);
                 if (name == "formatter" || name == "state" || name == "plugin-dir" || name == "backend" ||
-                    name == "format-param" || name == "dry-run") {
+                    name == "format-param" || name == "dry-run" || name == "confirm-within" ||
+                    name == "confirm" || name == "rollback") {
                     error += " (global options go before the first word)";
                 }
                 return false;

@@ -128,6 +128,16 @@ public:
     // Which host the session manages.
     BackendKind GetBackend() const;
 
+    // Changes that roll back by themselves (the Linux host; see Backend::Host). A failure
+    // throws HostCtlException with a message for the user (StateFileError when the checkpoint's
+    // files cannot be used). The simulated host keeps every change of a session until Commit:
+    // there BeginAtomic and EndAtomic do nothing and the others throw HostCtlException.
+    void ConfirmWithin(unsigned seconds);
+    void BeginAtomic();
+    void EndAtomic(bool keep);
+    void ConfirmCheckpoint();
+    void RollbackCheckpoint();
+
     struct Impl;
 
 private:

@@ -7,6 +7,7 @@
 #include <fstream>
 #include <iostream>
 
+#include "core/checkpoint.h"
 #include "core/text.h"
 #include "hostctl/exception.h"
 
@@ -18,6 +19,15 @@ Context::Context(Config config) : config_(std::move(config)), document_(config_.
 
 Context::~Context() {
     if (dryRun_) Kernel::SetDryRun({});
+}
+
+Checkpoints& Context::GetCheckpoints() {
+    if (!checkpoints_) checkpoints_ = std::make_unique<Checkpoints>(*this);
+    return *checkpoints_;
+}
+
+void Context::RequireUndoable(const std::string& what) {
+    GetCheckpoints().RequireUndoable(what);
 }
 
 bool Context::HasNetAdmin() {
@@ -34,7 +44,10 @@ bool Context::HasNetAdmin() {
 
 void Context::BeginChange() {
     if (!HasNetAdmin()) throw HostCtlException(kNeedsRoot);
-    if (!Kernel::DryRun()) document_.Lock();
+    // A dry run changes nothing: it neither locks the document nor takes a checkpoint.
+    if (Kernel::DryRun()) return;
+    document_.Lock();
+    GetCheckpoints().BeforeChange();
 }
 
 void Context::StartDryRun(Kernel::DryRunRecorder record) {

@@ -14,6 +14,8 @@
 
 namespace TknCtl::Linux {
 
+class Checkpoints;
+
 class Context {
 public:
     // The netstack of the namespace the program runs in.
@@ -41,6 +43,17 @@ public:
     // Whether the program has CAP_NET_ADMIN.
     static bool HasNetAdmin();
 
+    // The host's checkpoints (core/checkpoint.h): BeginChange takes one, or joins the pending
+    // one, before the first change of a session that asked for it.
+    Checkpoints& GetCheckpoints();
+    // A change that no checkpoint can take back (what: what a checkpoint does not hold, such as
+    // "the settings of a NIC's driver"): throws HostCtlException while the session's changes are
+    // to be rolled back (--confirm-within, an atomic batch, a pending checkpoint). Call it
+    // before BeginChange.
+    void RequireUndoable(const std::string& what);
+    // What a checkpoint does not hold of a NIC, for RequireUndoable.
+    static constexpr const char* kDriverSettings = "the settings of a NIC's driver (ethtool)";
+
     // The netstacks the kernel has: the default first, then the named namespaces of
     // /run/netns in name order (with those a dry run would make).
     std::vector<std::string> Netstacks() const;
@@ -62,6 +75,7 @@ private:
     Document document_;
     std::set<std::string> warned_;
     bool dryRun_ = false;
+    std::unique_ptr<Checkpoints> checkpoints_;
 };
 
 }  // namespace TknCtl::Linux

@@ -225,8 +225,8 @@ std::vector<BridgeLink> ListBridgeLinks(const Namespace& ns) {
     return links;
 }
 
-nl_msg* BuildBridgeAdd(const std::string& name, unsigned mtu) {
-    Message message = LinkRequest(RTM_NEWLINK, NLM_F_REQUEST | NLM_F_CREATE | NLM_F_EXCL, AF_UNSPEC, 0);
+nl_msg* BuildBridgeAdd(const std::string& name, unsigned mtu, int index) {
+    Message message = LinkRequest(RTM_NEWLINK, NLM_F_REQUEST | NLM_F_CREATE | NLM_F_EXCL, AF_UNSPEC, index);
     Put(nla_put_string(message.get(), IFLA_IFNAME, name.c_str()));
     Put(nla_put_u32(message.get(), IFLA_MTU, mtu));
     nlattr* info = Nest(message.get(), IFLA_LINKINFO);
@@ -235,8 +235,8 @@ nl_msg* BuildBridgeAdd(const std::string& name, unsigned mtu) {
     return message.release();
 }
 
-void AddBridge(const Namespace& ns, const std::string& name, unsigned mtu) {
-    Send(ns, BuildBridgeAdd(name, mtu), "Cannot create bridge " + name + In(ns));
+void AddBridge(const Namespace& ns, const std::string& name, unsigned mtu, int index) {
+    Send(ns, BuildBridgeAdd(name, mtu, index), "Cannot create bridge " + name + In(ns));
 }
 
 nl_msg* BuildLinkDelete(int index) {

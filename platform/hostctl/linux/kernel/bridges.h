@@ -78,9 +78,10 @@ std::vector<BridgeLink> ListBridgeLinks(const Namespace& ns);
 // A reply message (RTM_NEWLINK) reads into a plain value; nothing when it is no link message.
 std::optional<BridgeLink> ParseBridgeLink(nl_msg* message);
 
-// A new bridge of that name (RTM_NEWLINK, create exclusively), down, with its MTU.
-nl_msg* BuildBridgeAdd(const std::string& name, unsigned mtu);
-void AddBridge(const Namespace& ns, const std::string& name, unsigned mtu);
+// A new bridge of that name (RTM_NEWLINK, create exclusively), down, with its MTU; index asks
+// for an interface index (a bridge made again), 0 leaves it to the kernel.
+nl_msg* BuildBridgeAdd(const std::string& name, unsigned mtu, int index = 0);
+void AddBridge(const Namespace& ns, const std::string& name, unsigned mtu, int index = 0);
 // Deletes a link (RTM_DELLINK); a bridge releases its ports as it goes.
 nl_msg* BuildLinkDelete(int index);
 void DeleteLink(const Namespace& ns, int index, const std::string& name);

@@ -7,8 +7,10 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <cctype>
 #include <cstdio>
 #include <memory>
+#include <vector>
 
 #include "core/text.h"
 #include "hostctl/exception.h"
@@ -100,6 +102,44 @@ nl_msg* BuildNeighbourDelete(const Neighbour& neighbour) {
 void DeleteNeighbour(const Namespace& ns, const Neighbour& neighbour, const std::string& device) {
     Request(ns, BuildNeighbourDelete(neighbour),
             "Cannot remove the neighbour entry of " + neighbour.address + " on " + device);
+}
+
+nl_msg* BuildNeighbourAdd(const Neighbour& neighbour) {
+    unsigned char address[16];
+    if (!AddressBytes(neighbour.family, neighbour.address, address))
+        throw HostCtlException("Invalid neighbour address " + Lib::Quote(neighbour.address));
+    // "aa:bb:..." as bytes: two hexadecimal digits each, separated by colons.
+    std::vector<unsigned char> linkLayer;
+    const std::string& text = neighbour.linkLayer;
+    for (std::size_t i = 0; i < text.size(); i += 3) {
+        unsigned value = 0;
+        if (i + 2 > text.size() || (i + 2 < text.size() && text[i + 2] != ':') ||
+            std::sscanf(text.substr(i, 2).c_str(), "%2x", &value) != 1 ||
+            !std::isxdigit(static_cast<unsigned char>(text[i])) ||
+            !std::isxdigit(static_cast<unsigned char>(text[i + 1])))
+            throw HostCtlException("Invalid link-layer address " + Lib::Quote(text));
+        linkLayer.push_back(static_cast<unsigned char>(value));
+    }
+    std::unique_ptr<nl_msg, void (*)(nl_msg*)> message(
+        nlmsg_alloc_simple(RTM_NEWNEIGH, NLM_F_CREATE | NLM_F_REPLACE), nlmsg_free);
+    if (!message) throw HostCtlException("out of memory");
+    ndmsg info{};
+    info.ndm_family = static_cast<unsigned char>(neighbour.family);
+    info.ndm_ifindex = neighbour.index;
+    info.ndm_state = neighbour.state;
+    info.ndm_flags = neighbour.flags;
+    bool ok = nlmsg_append(message.get(), &info, sizeof(info), NLMSG_ALIGNTO) == 0 &&
+              nla_put(message.get(), NDA_DST, neighbour.family == AF_INET ? 4 : 16, address) == 0;
+    if (!linkLayer.empty())
+        ok = ok &&
+             nla_put(message.get(), NDA_LLADDR, static_cast<int>(linkLayer.size()), linkLayer.data()) == 0;
+    if (!ok) throw HostCtlException("cannot build a neighbour request: message too large");
+    return message.release();
+}
+
+void AddNeighbour(const Namespace& ns, const Neighbour& neighbour, const std::string& device) {
+    Request(ns, BuildNeighbourAdd(neighbour),
+            "Cannot add the neighbour entry of " + neighbour.address + " on " + device);
 }
 
 std::optional<NeighbourTiming> ParseNeighbourTiming(const nlmsghdr* message) {

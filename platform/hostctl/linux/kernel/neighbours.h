@@ -37,6 +37,11 @@ std::optional<Neighbour> ParseNeighbour(const nlmsghdr* message);
 // with nlmsg_free (Request does). Throws HostCtlException for an address not of its family.
 nl_msg* BuildNeighbourDelete(const Neighbour& neighbour);
 void DeleteNeighbour(const Namespace& ns, const Neighbour& neighbour, const std::string& device);
+// The request that adds the entry (its family, device, address, link-layer address, state and
+// flags), replacing one of that address; the caller frees it with nlmsg_free (Request does).
+// Throws HostCtlException for an address not of its family or a malformed link-layer address.
+nl_msg* BuildNeighbourAdd(const Neighbour& neighbour);
+void AddNeighbour(const Namespace& ns, const Neighbour& neighbour, const std::string& device);
 
 // How long the entries of a device's table keep each state, in milliseconds.
 struct NeighbourTiming {

@@ -33,9 +33,10 @@ void Put(int error) {
     if (error < 0) throw HostCtlException("cannot build a request to the kernel: " + ErrorText(error));
 }
 
-void PutHeader(nl_msg* message) {
+void PutHeader(nl_msg* message, int index = 0) {
     ifinfomsg header{};
     header.ifi_family = AF_UNSPEC;
+    header.ifi_index = index;
     Put(nlmsg_append(message, &header, sizeof(header), NLMSG_ALIGNTO));
 }
 
@@ -71,14 +72,14 @@ nlattr* Nest(nl_msg* message, int type) {
 nl_msg* BuildVethAdd(const VethPair& pair, int peerNamespaceFd) {
     Message message(nlmsg_alloc_simple(RTM_NEWLINK, NLM_F_REQUEST | NLM_F_CREATE | NLM_F_EXCL));
     if (!message) throw HostCtlException("out of memory");
-    PutHeader(message.get());
+    PutHeader(message.get(), pair.end.index);
     PutEnd(message.get(), pair.end);
     nlattr* info = Nest(message.get(), IFLA_LINKINFO);
     Put(nla_put_string(message.get(), IFLA_INFO_KIND, "veth"));
     nlattr* data = Nest(message.get(), IFLA_INFO_DATA);
     // The peer is a link request of its own inside the nest: its ifinfomsg, then its attributes.
     nlattr* peer = Nest(message.get(), VETH_INFO_PEER);
-    PutHeader(message.get());
+    PutHeader(message.get(), pair.peer.index);
     PutEnd(message.get(), pair.peer);
     if (peerNamespaceFd >= 0)
         Put(nla_put_u32(message.get(), IFLA_NET_NS_FD, static_cast<std::uint32_t>(peerNamespaceFd)));

@@ -29,6 +29,7 @@ struct VethEnd {
     unsigned mtu = 0;         // 0: the kernel's (1500)
     unsigned rxQueues = 0;    // 0: the kernel's (one per possible CPU)
     unsigned gsoMaxSize = 0;  // 0: the kernel's
+    int index = 0;            // the interface index asked for (one made again); 0: the kernel's
 
     bool operator==(const VethEnd&) const = default;
 };

@@ -84,6 +84,9 @@ struct SpName {
     }
 };
 
+// What a checkpoint does not hold: a removed association cannot be made again.
+constexpr const char* kSaKeys = "the keys of IPsec security associations (the kernel never gives them back)";
+
 // A state the commands can show: IPv6 ESP in transport or tunnel mode with named algorithms.
 bool IsAssociation(const Kernel::XfrmState& state) {
     return state.family == Kernel::kXfrmInet6 && state.protocol == Kernel::kXfrmEsp &&
@@ -212,6 +215,7 @@ public:
     }
 
     void RemoveSa(const std::string& name) override {
+        context_.RequireUndoable(kSaKeys);
         context_.BeginChange();
         auto names = SaNames();
         for (const auto& state : Kernel::ListStates(ns_)) {
@@ -228,6 +232,7 @@ public:
 
     void RemoveAutoSa(const Net::Ipv6Address& source, const Net::Ipv6Address& destination,
                       std::uint32_t spi) override {
+        context_.RequireUndoable(kSaKeys);
         context_.BeginChange();
         auto names = SaNames();
         for (const auto& state : Kernel::ListStates(ns_)) {
@@ -242,6 +247,7 @@ public:
     }
 
     void FlushSas() override {
+        context_.RequireUndoable(kSaKeys);
         context_.BeginChange();
         for (const auto& state : Kernel::ListStates(ns_)) {
             if (IsAssociation(state))

@@ -392,6 +392,8 @@ void LinuxNics::SetPnicInfo(const std::string& name, const Net::PnicInfo& info) 
         !mac)
         return;
 
+    if (info.portChanged || info.phyAddressChanged || info.wakeOnChanged || info.messageLevelChanged)
+        context_.RequireUndoable(Context::kDriverSettings);
     context_.BeginChange();
     // Each setting is its own request: when one is refused, those before it stay changed, and
     // the message says which.
@@ -479,6 +481,7 @@ void LinuxNics::SetSpeedDuplex(const std::string& name, std::uint32_t speed, std
                                ": give a speed in Mbps with full (1) or half (2) duplex, or 0/0 for "
                                "auto-negotiation");
     }
+    context_.RequireUndoable(Context::kDriverSettings);
     context_.BeginChange();
     std::map<int, std::uint32_t> values{
         {ETHTOOL_A_LINKMODES_AUTONEG, automatic ? AUTONEG_ENABLE : AUTONEG_DISABLE}};

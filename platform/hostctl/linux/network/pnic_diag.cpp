@@ -107,6 +107,7 @@ std::uint32_t LinuxNics::BeginEepromWrite(const std::string& name, std::int64_t 
     Require(name);
     if (magic < 0 || magic > 0xffffffffLL)
         throw HostCtlException("Magic key " + std::to_string(magic) + " does not fit in 32 bits");
+    context_.RequireUndoable("the EEPROM of a NIC");
     context_.BeginChange();
     try {
         const std::uint32_t size = Kernel::ReadDriverInfo(name).eepromLength;

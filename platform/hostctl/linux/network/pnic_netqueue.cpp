@@ -145,6 +145,7 @@ void LinuxNics::SetNetqueueInfo(const std::string& name, const Net::PnicNetqueue
         };
         if (info.setTxCount) direction("TX", info.txQueueCount, channels.txMax, ETHTOOL_A_CHANNELS_TX_COUNT);
         if (info.setRxCount) direction("RX", info.rxQueueCount, channels.rxMax, ETHTOOL_A_CHANNELS_RX_COUNT);
+        context_.RequireUndoable(Context::kDriverSettings);
         context_.BeginChange();
         Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_CHANNELS_SET, name, wanted), name,
                "the channels");
@@ -178,6 +179,7 @@ void LinuxNics::SetNetqueueInfo(const std::string& name, const Net::PnicNetqueue
                 if (spread && channels.reported && channels.rx + channels.combined < 2)
                     throw HostCtlException(name +
                                            " has one RX queue: RSS has nothing to spread traffic over");
+                context_.RequireUndoable(Context::kDriverSettings);
                 context_.BeginChange();
                 Kernel::WriteRssTable(name, spread ? std::vector<std::uint32_t>()
                                                    : std::vector<std::uint32_t>(table.size(), 0));

@@ -76,6 +76,7 @@ void LinuxNics::GetPauseParams(const std::string& name, Net::PnicPauseParams& pa
 
 void LinuxNics::SetPauseParams(const std::string& name, const Net::PnicPauseParams& pause) {
     Require(name);
+    context_.RequireUndoable(Context::kDriverSettings);
     context_.BeginChange();
     Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_PAUSE_SET, name,
                                    {{ETHTOOL_A_PAUSE_AUTONEG, pause.autoNegotiate},
@@ -172,6 +173,7 @@ void LinuxNics::SetCoalesceParams(const std::string& name, const Net::PnicCoales
                                DriverOf(name) + ") does not support " + Join(unsupported));
     }
     if (changes.empty()) return;
+    context_.RequireUndoable(Context::kDriverSettings);
     context_.BeginChange();
     Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_COALESCE_SET, name, changes), name,
            "the coalesce parameters");
@@ -238,6 +240,7 @@ void LinuxNics::ChangeFeatures(const std::string& name,
                                const std::vector<std::pair<std::string, bool>>& wanted,
                                const std::string& what) {
     if (wanted.empty()) return;
+    context_.RequireUndoable(Context::kDriverSettings);
     context_.BeginChange();
     Change(Kernel::BuildFeaturesSet(Ethtool().Family(), name, wanted), name, what);
     if (Kernel::DryRun()) return;  // a dry run changed nothing to read back
@@ -323,6 +326,7 @@ void LinuxNics::SetRingParams(const std::string& name, const Net::PnicRingParams
     if (params.mask & Net::PNIC_RING_RX_JUMBO) sizes[ETHTOOL_A_RINGS_RX_JUMBO] = params.rxJumbo;
     if (params.mask & Net::PNIC_RING_TX) sizes[ETHTOOL_A_RINGS_TX] = params.tx;
     if (sizes.empty()) return;
+    context_.RequireUndoable(Context::kDriverSettings);
     context_.BeginChange();
     Change(Kernel::BuildEthtoolSet(Ethtool().Family(), ETHTOOL_MSG_RINGS_SET, name, sizes), name,
            "the ring sizes");

@@ -53,6 +53,7 @@ void LinuxNics::SetUplinkVlanStatsEnabled(const std::string& switchName, const s
                                "not have (CONFIG_BRIDGE_VLAN_FILTERING)");
     }
     if (*current == enabled) return;
+    context_.RequireUndoable("the VLAN counters setting of a bridge");
     context_.BeginChange();
     try {
         Kernel::ChangeBridgeVlanStats(Own(), bridge.index, enabled);

@@ -68,6 +68,20 @@ public:
     // of being made (reads still reach the kernel), the host's own document is never written
     // (Commit keeps its changes in memory), and a check that reads back a change is left out.
     virtual void StartDryRun(DryRunRecorder record) = 0;
+
+    // Changes that roll back by themselves, on a host that keeps checkpoints (the Linux host;
+    // by default a host keeps none and these throw HostCtl::Lib::HostCtlException saying so).
+    // ConfirmWithin: before the first change of the session a checkpoint is taken of what it may
+    // change; unless ConfirmCheckpoint runs within that many seconds (in any session), the
+    // host restores it by itself, whatever becomes of this process.
+    virtual void ConfirmWithin(unsigned seconds);
+    // BeginAtomic: a checkpoint is taken before the first change; EndAtomic(false) restores it
+    // at once, EndAtomic(true) drops it (or leaves it to ConfirmWithin's deadline).
+    virtual void BeginAtomic();
+    virtual void EndAtomic(bool keep);
+    // The pending checkpoint: the changes made since are kept / undone now.
+    virtual void ConfirmCheckpoint();
+    virtual void RollbackCheckpoint();
 };
 
 }  // namespace TknCtl::Backend

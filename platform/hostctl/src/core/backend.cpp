@@ -16,11 +16,36 @@
 #include "backend/routing.h"
 #include "backend/switches.h"
 #include "core/text.h"
+#include "hostctl/exception.h"
 #include "hostctl/session.h"
 
 namespace TknCtl::Backend {
 
 Host::~Host() = default;
+
+namespace {
+
+[[noreturn]] void KeepsNoCheckpoints(const Host& host) {
+    throw HostCtl::Lib::HostCtlException("The " + host.Describe() + " keeps no checkpoints");
+}
+
+}  // namespace
+
+void Host::ConfirmWithin(unsigned) {
+    KeepsNoCheckpoints(*this);
+}
+void Host::BeginAtomic() {
+    KeepsNoCheckpoints(*this);
+}
+void Host::EndAtomic(bool) {
+    KeepsNoCheckpoints(*this);
+}
+void Host::ConfirmCheckpoint() {
+    KeepsNoCheckpoints(*this);
+}
+void Host::RollbackCheckpoint() {
+    KeepsNoCheckpoints(*this);
+}
 Interfaces::~Interfaces() = default;
 Routing::~Routing() = default;
 Dns::~Dns() = default;

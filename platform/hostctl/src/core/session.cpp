@@ -517,6 +517,29 @@ BackendKind HostSession::GetBackend() const {
     return impl_->realHost ? BackendKind::kLinux : BackendKind::kSimulated;
 }
 
+void HostSession::ConfirmWithin(unsigned seconds) {
+    if (!impl_->realHost) throw HostCtlException("The simulated host keeps no checkpoints");
+    impl_->realHost->ConfirmWithin(seconds);
+}
+
+void HostSession::BeginAtomic() {
+    if (impl_->realHost) impl_->realHost->BeginAtomic();
+}
+
+void HostSession::EndAtomic(bool keep) {
+    if (impl_->realHost) impl_->realHost->EndAtomic(keep);
+}
+
+void HostSession::ConfirmCheckpoint() {
+    if (!impl_->realHost) throw HostCtlException("The simulated host keeps no checkpoints");
+    impl_->realHost->ConfirmCheckpoint();
+}
+
+void HostSession::RollbackCheckpoint() {
+    if (!impl_->realHost) throw HostCtlException("The simulated host keeps no checkpoints");
+    impl_->realHost->RollbackCheckpoint();
+}
+
 }  // namespace HostCtl::Lib
 
 namespace TknCtl::Lib {

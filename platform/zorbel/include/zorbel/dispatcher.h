@@ -37,7 +37,14 @@ struct GlobalOptions {
     std::vector<std::pair<std::string, std::string>> formatParameters;
     std::string manual;      // --manual ("man") or --manual=markdown; empty: not asked
     std::string completion;  // --completion=bash|zsh; empty: not asked
+    // Changes that roll back by themselves (a host that keeps checkpoints: the Linux host).
+    unsigned confirmWithin = 0;  // --confirm-within=SECONDS (1 to kMaxConfirmWithin); 0: not given
+    bool confirm = false;        // --confirm: keep the changes of the pending checkpoint
+    bool rollback = false;       // --rollback: restore the pending checkpoint now
 };
+
+// The longest wait --confirm-within takes: a day.
+constexpr unsigned kMaxConfirmWithin = 86400;
 
 // Splits argv (without the program name) into global options and the rest (words and
 // command options). Returns false and sets error when a global option is malformed.

@@ -14,6 +14,7 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <map>
 #include <sstream>
 #include <thread>
 
@@ -299,6 +300,12 @@ TEST_F(CheckpointTest, AConfirmedChangeStays) {
 // a netstack, the resolver, the firewall, IPsec policies, shaping, neighbours, tags.
 TEST_F(CheckpointTest, AnExplicitRollbackRestoresEverythingAndTheKernelsSideEffects) {
     ASSERT_TRUE(Ok("network ip interface add -p pg2 -m 9000 -M 02:aa:bb:cc:dd:ee"));
+    // An interface in a netstack of its own: a veth pair between two namespaces.
+    ASSERT_TRUE(Ok("network vswitch standard portgroup add -v vs1 -p pg3"));
+    ASSERT_TRUE(Ok("network ip interface add -p pg3 -N glidex"));
+    ASSERT_TRUE(Ok("network ip interface ipv4 set -i tkn2 -t static -I 10.3.0.1 -N 255.255.255.0"));
+    ASSERT_TRUE(Ok("network ip interface ipv6 set -i tkn2 -e true -r false"));
+    ASSERT_TRUE(Ok("network ip interface ipv6 address add -i tkn2 -I 2001:db8:5::1/64"));
     ASSERT_TRUE(Ok("network ip interface ipv4 set -i tkn1 -t static -I 10.2.0.1 -N 255.255.255.0"));
     ASSERT_TRUE(Ok("network vswitch standard policy shaping set -v vs1 -e true -b 1000 -k 2000 -t 100"));
     Sh("ip route add 10.8.0.0/16 via 10.2.0.9 proto static");
@@ -309,6 +316,7 @@ TEST_F(CheckpointTest, AnExplicitRollbackRestoresEverythingAndTheKernelsSideEffe
         "network ip neighbor remove -v 4 -a 10.1.0.7",
         "network ip interface ipv4 set -i tkn0 -t none",  // the kernel takes 10.9.0.0/16 and 10.1.0.8 along
         "network ip interface remove -i tkn1",            // and 10.8.0.0/16 with the device
+        "network ip interface remove -p pg3 -N glidex",
         "network ip interface add -p pg2",
         "network ip netstack add -N lab",
         "network ip dns server add -s 192.0.2.99",
@@ -328,6 +336,18 @@ TEST_F(CheckpointTest, AnExplicitRollbackRestoresEverythingAndTheKernelsSideEffe
     EXPECT_FALSE(HasRoute("10.9.0.0/16"));
     EXPECT_FALSE(HasRoute("10.8.0.0/16"));
     EXPECT_TRUE(Pending());
+    // The checkpoint knows each end of the pair between the two netstacks by the other.
+    std::map<std::string, std::string> peers;
+    const json snapshot = json::parse(Hadro::Test::Slurp(checkpoint_ + "/snapshot.json"));
+    for (const auto& netstack : snapshot["netstacks"]) {
+        for (const auto& link : netstack["links"]) {
+            if (link["name"] == "tkn2" || link["name"] == "tkn2-port")
+                peers[netstack["name"].get<std::string>() + "/" + link["name"].get<std::string>()] =
+                    link["peerNetstack"].get<std::string>() + "/" + link["peerName"].get<std::string>();
+        }
+    }
+    EXPECT_EQ(peers, (std::map<std::string, std::string>{{"defaultTcpipStack/tkn2-port", "glidex/tkn2"},
+                                                         {"glidex/tkn2", "defaultTcpipStack/tkn2-port"}}));
 
     ASSERT_TRUE(Ok("--rollback"));
     EXPECT_TRUE(BackTo(before));

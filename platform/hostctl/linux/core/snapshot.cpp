@@ -733,8 +733,16 @@ Snapshot TakeSnapshot(Context& context) {
         read.push_back(ReadOne(name, context.NamespaceOf(name)));
 
     // Each veth's other end, by netstack and name: in its own netstack when the kernel names no
-    // other namespace, else in the netstack whose namespace has that ID from this one.
-    for (auto& one : read) {
+    // other namespace, else in the netstack whose namespace has that ID from this one (asked
+    // once for each two netstacks).
+    std::map<std::pair<std::size_t, std::size_t>, std::optional<int>> ids;
+    auto idOf = [&](std::size_t from, std::size_t of) {
+        auto [it, fresh] = ids.try_emplace({from, of});
+        if (fresh) it->second = Kernel::NamespaceId(read[from].ns, read[of].ns);
+        return it->second;
+    };
+    for (std::size_t i = 0; i < read.size(); ++i) {
+        auto& one = read[i];
         for (auto& link : one.saved.links) {
             auto it = one.peers.find(link.name);
             if (it == one.peers.end()) continue;
@@ -743,10 +751,9 @@ Snapshot TakeSnapshot(Context& context) {
             if (!peer.namespaceId) {
                 where = &one;
             } else {
-                for (const auto& other : read) {
-                    if (&other == &one) continue;
-                    if (Kernel::NamespaceId(one.ns, other.ns) == peer.namespaceId) {
-                        where = &other;
+                for (std::size_t j = 0; j < read.size(); ++j) {
+                    if (j != i && idOf(i, j) == peer.namespaceId) {
+                        where = &read[j];
                         break;
                     }
                 }
@@ -757,8 +764,9 @@ Snapshot TakeSnapshot(Context& context) {
             link.peerNetstack = where->saved.name;
             link.peerName = name->second;
         }
-        snapshot.netstacks.push_back(std::move(one.saved));
     }
+    for (auto& one : read)
+        snapshot.netstacks.push_back(std::move(one.saved));
 
     const auto own = Kernel::Namespace::Own();
     Kernel::Nftables* nft = nullptr;

@@ -211,6 +211,29 @@ protected:
         return failure;
     }
 
+    // hadrocli --confirm-within ... --batch reading its lines from a FIFO (lines: its writing
+    // end), in a process group of its own; its output goes to dir_/batch.out and batch.err.
+    pid_t StartBatch(const std::string& options, int& lines) {
+        const std::string fifo = dir_ + "/lines";
+        if (mkfifo(fifo.c_str(), 0600) != 0) return -1;
+        pid_t child = fork();
+        if (child == 0) {
+            setpgid(0, 0);
+            const std::string command = std::string("exec '") + HADROCLI + "' --plugin-dir='" +
+                                        HADRO_PLUGIN_DIR + "' --backend=linux " + options + " --batch - <'" +
+                                        fifo + "' >'" + dir_ + "/batch.out' 2>'" + dir_ + "/batch.err'";
+            execl("/bin/sh", "sh", "-c", command.c_str(), static_cast<char*>(nullptr));
+            _exit(127);
+        }
+        if (child > 0) setpgid(child, child);
+        lines = open(fifo.c_str(), O_WRONLY);
+        return child;
+    }
+    static bool Send(int lines, const std::string& line) {
+        const std::string text = line + "\n";
+        return write(lines, text.data(), text.size()) == static_cast<ssize_t>(text.size());
+    }
+
     bool HasRoute(const std::string& destination) {
         return !ShJson("ip -j route show " + destination).empty();
     }
@@ -358,25 +381,11 @@ TEST_F(CheckpointTest, AnExplicitRollbackRestoresEverythingAndTheKernelsSideEffe
 
 TEST_F(CheckpointTest, AKilledCommandStillGetsItsRollback) {
     const json before = Steady();
-    // The command in a process group of its own, reading a batch from a FIFO: killed with its
-    // group as soon as its first line has changed the host.
-    const std::string fifo = dir_ + "/lines";
-    ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
-    pid_t child = fork();
-    if (child == 0) {
-        setpgid(0, 0);
-        const std::string command = std::string("exec '") + HADROCLI + "' --plugin-dir='" + HADRO_PLUGIN_DIR +
-                                    "' --backend=linux --confirm-within=2 --batch - <'" + fifo +
-                                    "' >/dev/null 2>&1";
-        execl("/bin/sh", "sh", "-c", command.c_str(), static_cast<char*>(nullptr));
-        _exit(127);
-    }
+    // Killed with its process group as soon as its first line has changed the host.
+    int lines = -1;
+    const pid_t child = StartBatch("--confirm-within=2", lines);
     ASSERT_GT(child, 0);
-    setpgid(child, child);
-    int lines = open(fifo.c_str(), O_WRONLY);
-    ASSERT_GE(lines, 0);
-    const std::string line = "network ip route ipv4 add -n 10.20.0.0/16 -g 10.1.0.2\n";
-    ASSERT_EQ(write(lines, line.data(), line.size()), static_cast<ssize_t>(line.size()));
+    ASSERT_TRUE(Send(lines, "network ip route ipv4 add -n 10.20.0.0/16 -g 10.1.0.2"));
     EXPECT_TRUE(Eventually([&] { return HasRoute("10.20.0.0/16") && Pending(); }, 5s));
     kill(-child, SIGKILL);
     int status = 0;
@@ -386,6 +395,38 @@ TEST_F(CheckpointTest, AKilledCommandStillGetsItsRollback) {
     EXPECT_TRUE(HasRoute("10.20.0.0/16"));
 
     EXPECT_TRUE(BackTo(before));
+    EXPECT_FALSE(Pending());
+}
+
+TEST_F(CheckpointTest, AWatcherGoneBeforeTheFirstChangeStopsIt) {
+    int lines = -1;
+    const pid_t child = StartBatch("--confirm-within=30", lines);
+    ASSERT_GT(child, 0);
+    // The first line opens the session and starts the watcher; it goes before any change.
+    ASSERT_TRUE(Send(lines, "network ip route ipv4 list"));
+    pid_t watcher = 0;
+    ASSERT_TRUE(Eventually(
+        [&] {
+            for (pid_t pid : Watchers()) {
+                if (Hadro::Test::Has(Hadro::Test::Slurp("/proc/" + std::to_string(pid) + "/stat"),
+                                     "(hadro-watcher)"))
+                    watcher = pid;
+            }
+            return watcher != 0;
+        },
+        5s));
+    kill(watcher, SIGKILL);
+    ASSERT_TRUE(Send(lines, "network ip route ipv4 add -n 10.20.0.0/16 -g 10.1.0.2"));
+    close(lines);
+    int status = 0;
+    waitpid(child, &status, 0);
+    ASSERT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 1);
+    const std::string err = Hadro::Test::Slurp(dir_ + "/batch.err");
+    EXPECT_TRUE(Hadro::Test::Has(
+        err, "Cannot take a checkpoint: its watcher is gone\nline 2: network ip route ipv4 add"))
+        << err;
+    EXPECT_FALSE(HasRoute("10.20.0.0/16"));
     EXPECT_FALSE(Pending());
 }
 
@@ -441,6 +482,51 @@ TEST_F(CheckpointTest, AChangeWhileOneIsPendingJoinsIt) {
 
     ASSERT_TRUE(Ok("--rollback"));
     EXPECT_TRUE(BackTo(before));
+}
+
+TEST_F(CheckpointTest, ACheckpointThatCannotBeRestoredOrReadIsSaidSo) {
+    // A device of a kind the host never makes goes while the checkpoint is pending: the rest
+    // comes back, what cannot is said, and the checkpoint stays for another try.
+    Sh("ip link add m1 link e1-wire type macvlan");
+    ASSERT_TRUE(Ok("--confirm-within=60 network ip route ipv4 add -n 10.20.0.0/16 -g 10.1.0.2"));
+    Sh("ip link del m1");
+    auto rollback = Hadro("--rollback");
+    EXPECT_EQ(rollback.status, 1);
+    EXPECT_EQ(
+        rollback.err,
+        "Error: The host still differs from its checkpoint: device m1 (macvlan) is gone and cannot be made "
+        "again; the checkpoint is kept: 'hadrocli --backend=linux --rollback' tries again, 'hadrocli "
+        "--backend=linux --confirm' keeps the host as it is\n");
+    EXPECT_FALSE(HasRoute("10.20.0.0/16"));
+    EXPECT_TRUE(Pending());
+    ASSERT_TRUE(Ok("--confirm"));
+    EXPECT_FALSE(std::filesystem::exists(checkpoint_));
+
+    // Damaged files: a read says so and goes on, a change and --rollback are refused naming the
+    // file (exit 3), --confirm removes them.
+    ASSERT_TRUE(Ok("--confirm-within=60 network ip route ipv4 add -n 10.21.0.0/16 -g 10.1.0.2"));
+    std::ofstream(checkpoint_ + "/snapshot.json", std::ios::trunc) << "{\"version\": 1";
+    auto damaged = Hadro("--rollback");
+    EXPECT_EQ(damaged.status, 3);
+    EXPECT_EQ(damaged.err, "Error: Linux host checkpoint " + checkpoint_ +
+                               "/snapshot.json: the snapshot is not valid JSON\n");
+    std::ofstream(checkpoint_ + "/pending.json", std::ios::trunc) << "nothing";
+    const std::string warning =
+        "Warning: Linux host checkpoint " + checkpoint_ +
+        "/pending.json: not a JSON object: 'hadrocli --backend=linux --confirm' removes it\n";
+    auto read = Hadro("network ip route ipv4 list");
+    EXPECT_EQ(read.status, 0);
+    EXPECT_EQ(read.err, warning);
+    auto change = Hadro("network ip route ipv4 add -n 10.22.0.0/16 -g 10.1.0.2");
+    EXPECT_EQ(change.status, 3);
+    EXPECT_EQ(change.err,
+              warning + "Error: unexpected failure in 'network ip route ipv4 add': Linux host checkpoint " +
+                  checkpoint_ + "/pending.json: not a JSON object\n");
+    EXPECT_FALSE(HasRoute("10.22.0.0/16"));
+    EXPECT_EQ(Hadro("--rollback").status, 3);
+    ASSERT_TRUE(Ok("--confirm"));
+    EXPECT_FALSE(std::filesystem::exists(checkpoint_));
+    EXPECT_TRUE(Ok("network ip route ipv4 list"));
 }
 
 // ---------------------------------------------------------------- atomic batches

@@ -416,6 +416,7 @@ TEST_F(CheckpointTest, AWatcherGoneBeforeTheFirstChangeStopsIt) {
         },
         5s));
     kill(watcher, SIGKILL);
+    ASSERT_TRUE(Eventually([&] { return Watchers().size() == 1; }, 5s));  // the batch alone
     ASSERT_TRUE(Send(lines, "network ip route ipv4 add -n 10.20.0.0/16 -g 10.1.0.2"));
     close(lines);
     int status = 0;

@@ -113,6 +113,7 @@ Snapshot Host() {
     glidex.routes = {R("10.1.0.0", 24, 2, {{"", "tkn1"}}, 0, 253),
                      R("10.9.0.0", 16, 4, {{"10.1.0.254", "tkn1"}}, 5)};
     s.netstacks = {own, glidex};
+    s.netstackFiles = true;
     s.firewall = R"([{"table":{"family":"inet","name":"hadro"}}])";
     SavedPolicy policy;
     policy.selector.destination = "2001:db8::";
@@ -489,6 +490,9 @@ TEST(RestorePlan, FirewallXfrmFilesAndTheDocument) {
     EXPECT_EQ(
         Plan(live, without, RestorePhase::kRest),
         (std::vector<std::string>{"remove the firewall's nftables table", "remove the host's document"}));
+    without.netstackFiles = false;
+    EXPECT_EQ(Plan(live, without, RestorePhase::kRest).front(), "remove /etc/netns");
+    without.netstackFiles = true;
     without.firewallKnown = false;
     Netstack(without, "defaultTcpipStack").resolvManaged = true;
     Netstack(live, "defaultTcpipStack").resolvConf = "changed by the daemon\n";

@@ -422,6 +422,10 @@ void PlanRoutes(const Snapshot& live, const Snapshot& wanted, std::vector<Restor
 }
 
 void PlanRest(const Snapshot& live, const Snapshot& wanted, std::vector<RestoreStep>& steps) {
+    // /etc/netns, once the netstacks' own directories in it are as they were.
+    if (wanted.netstackFiles != live.netstackFiles)
+        steps.push_back(
+            Step(wanted.netstackFiles ? Action::kMakeFilesDirectory : Action::kRemoveFilesDirectory, {}));
     if (wanted.firewallKnown && live.firewallKnown && wanted.firewall != live.firewall) {
         RestoreStep step = Step(wanted.firewall ? Action::kSetFirewall : Action::kDeleteFirewall, {});
         step.value = wanted.firewall.value_or("");
@@ -479,9 +483,10 @@ public:
 
     void Apply(const RestoreStep& step) {
         // Netstacks are made and removed by name; every other step works inside one.
-        const bool byName = step.action == Action::kAddNetstack ||
-                            step.action == Action::kMakeNetstackFiles ||
-                            step.action == Action::kRemoveNetstackFiles || step.action == Action::kCannot;
+        const bool byName =
+            step.action == Action::kAddNetstack || step.action == Action::kMakeNetstackFiles ||
+            step.action == Action::kRemoveNetstackFiles || step.action == Action::kCannot ||
+            step.action == Action::kMakeFilesDirectory || step.action == Action::kRemoveFilesDirectory;
         const Kernel::Namespace ns =
             byName || step.netstack.empty() ? Kernel::Namespace::Own() : context_.NamespaceOf(step.netstack);
         switch (step.action) {
@@ -511,6 +516,14 @@ public:
                 if (!Kernel::RemoveNamespaceFiles(step.name))
                     throw HostCtlException(std::string(Kernel::kNamespaceFiles) + "/" + step.name +
                                            " holds files other than resolv.conf");
+                return;
+            case Action::kMakeFilesDirectory:
+                if (mkdir(Kernel::kNamespaceFiles, 0755) != 0 && errno != EEXIST)
+                    throw HostCtlException(std::string("cannot make it: ") + std::strerror(errno));
+                return;
+            case Action::kRemoveFilesDirectory:
+                if (rmdir(Kernel::kNamespaceFiles) != 0 && errno != ENOENT)
+                    throw HostCtlException(std::string("cannot remove it: ") + std::strerror(errno));
                 return;
             case Action::kSetSysctl:
                 return Kernel::WriteSysctl(ns, step.name, step.value);
@@ -766,6 +779,10 @@ std::string RestoreStep::Describe() const {
             return "make " + std::string(Kernel::kNamespaceFiles) + "/" + name;
         case Action::kRemoveNetstackFiles:
             return "remove " + std::string(Kernel::kNamespaceFiles) + "/" + name;
+        case Action::kMakeFilesDirectory:
+            return "make " + std::string(Kernel::kNamespaceFiles);
+        case Action::kRemoveFilesDirectory:
+            return "remove " + std::string(Kernel::kNamespaceFiles);
         case Action::kSetSysctl:
             return "set net." + name + " to " + value + where;
         case Action::kDeleteLink:

@@ -35,6 +35,8 @@ struct RestoreStep {
         kAddNetstack,
         kMakeNetstackFiles,
         kRemoveNetstackFiles,
+        kMakeFilesDirectory,  // /etc/netns
+        kRemoveFilesDirectory,
         kSetSysctl,
         kDeleteLink,
         kAddBridge,

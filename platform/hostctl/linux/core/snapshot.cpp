@@ -663,6 +663,7 @@ std::string SnapshotToJson(const Snapshot& snapshot) {
     for (const auto& n : snapshot.netstacks)
         netstacks.push_back(ToJson(n));
     out["netstacks"] = std::move(netstacks);
+    out["netstackFiles"] = snapshot.netstackFiles;
     out["firewallKnown"] = snapshot.firewallKnown;
     out["firewall"] = snapshot.firewall ? json(*snapshot.firewall) : json();
     json policies = json::array(), states = json::array();
@@ -692,6 +693,7 @@ Snapshot SnapshotFromJson(std::string_view text) {
     s.netstacks = List<SavedNetstack>(r, "netstacks", NetstackFrom);
     if (s.netstacks.empty() || s.netstacks.front().name != Context::kDefaultNetstack)
         throw std::invalid_argument("the snapshot does not start with the default netstack");
+    s.netstackFiles = r.Bool("netstackFiles");
     s.firewallKnown = r.Bool("firewallKnown");
     s.firewall = r.MaybeString("firewall");
     s.policies = List<SavedPolicy>(r, "policies", PolicyFrom);
@@ -767,6 +769,7 @@ Snapshot TakeSnapshot(Context& context) {
     }
     for (auto& one : read)
         snapshot.netstacks.push_back(std::move(one.saved));
+    snapshot.netstackFiles = Exists(Kernel::kNamespaceFiles);
 
     const auto own = Kernel::Namespace::Own();
     Kernel::Nftables* nft = nullptr;

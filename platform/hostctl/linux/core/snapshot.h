@@ -15,7 +15,7 @@
 //   neighbours     permanent entries
 //   sysctls        those the host writes: somaxconn, tcp_congestion_control, disable_ipv6
 //                  (all and default)
-//   files          its resolv.conf, and whether /etc/netns/NAME is there
+//   files          its resolv.conf, and whether /etc/netns/NAME is there (and /etc/netns)
 // Once for the host: the firewall's nftables table (inet hadro), the xfrm policies, the xfrm
 // states by their identity (never their keys: the kernel does not give them back), and the
 // host's own document.
@@ -164,6 +164,7 @@ struct SavedState {
 struct Snapshot {
     std::int64_t taken = 0;                // seconds since the epoch
     std::vector<SavedNetstack> netstacks;  // the default netstack first
+    bool netstackFiles = false;            // /etc/netns, where netstacks keep their files
     bool firewallKnown = true;             // false: nftables could not be read (left alone)
     std::optional<std::string> firewall;   // the table's objects (libnftables JSON); nothing: no table
     std::vector<SavedPolicy> policies;

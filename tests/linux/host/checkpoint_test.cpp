@@ -622,6 +622,10 @@ TEST_F(CheckpointTest, TheOptionsAndTheirRefusals) {
     }
     refused("--backend=linux --confirm-within", "option --confirm-within needs a value");
     refused("--backend=linux --confirm --rollback", "options --confirm and --rollback cannot be combined");
+    refused("--backend=linux --dry-run --confirm-within=5 network ip dns server add -s 10.0.0.1",
+            "option --dry-run changes nothing: it cannot be combined with --confirm-within");
+    refused("--backend=linux --dry-run --rollback",
+            "option --dry-run changes nothing: it cannot be combined with --rollback");
     refused("--backend=linux --confirm network nic list",
             "option --confirm runs no command; 'network' cannot follow it");
     const std::string alone =

@@ -156,6 +156,10 @@ public:
         }
         int one = 1;
         static_cast<void>(setsockopt(fd_, SOL_NETLINK, NETLINK_EXT_ACK, &one, sizeof(one)));
+        // Dumps are checked strictly, so that the kernel itself leaves out what a request's
+        // header filters (a routing table, say). A kernel without strict checking dumps
+        // everything, and what is not wanted is left out here as well.
+        static_cast<void>(setsockopt(fd_, SOL_NETLINK, NETLINK_GET_STRICT_CHK, &one, sizeof(one)));
     }
     ~DumpSocket() { close(fd_); }
     DumpSocket(const DumpSocket&) = delete;

@@ -85,6 +85,8 @@ std::vector<Route> ListRoutes(const Namespace& ns, int family, unsigned table, b
     std::vector<Route> out;
     rtmsg header{};
     header.rtm_family = static_cast<unsigned char>(family);
+    // The kernel walks that table alone (the local table of a host of many addresses is large).
+    if (table > 0 && table < 256) header.rtm_table = static_cast<unsigned char>(table);
     Dump(
         ns, RTM_GETROUTE, &header, sizeof(header), [&] { out.clear(); },
         [&](const nlmsghdr* message) {
